@@ -1,0 +1,95 @@
+#include "driver/DatasetNames.hpp"
+
+#include "host/Exception.hpp"
+#include "host/TextServices.hpp"
+#include "host/fileio/DataSourceFactory.hpp"
+#include "host/fileio/QueryComponents.hpp"
+#include "host/fileio/URI.hpp"
+
+#include <algorithm>
+#include <cctype>
+#include <memory>
+
+using orv::core::fileio::DataSource;
+using orv::core::fileio::DataSourceFactory;
+using orv::core::fileio::File;
+using orv::core::fileio::QueryComponents;
+using orv::core::fileio::URI;
+
+namespace {
+
+const std::string kCalibrationPrefix = ":calibration type:";
+const char *const kCalibrationKey = "c";
+
+std::string LowerCase(std::string text) {
+    std::transform(text.begin(), text.end(), text.begin(),
+                   [](unsigned char c) { return std::tolower(c); });
+    return text;
+}
+
+std::string NormalizeUriName(const URI &uri) {
+    std::string choice = uri.GetFirstValue(kCalibrationKey);
+    if (choice.empty())
+        return uri.ToString();
+    QueryComponents query = uri.GetQueryComponents();
+    query.SetPair(kCalibrationKey, NormalizeCalibrationName(choice));
+    return uri.SetQueryComponents(query)->ToString();
+}
+
+std::string NormalizeFileName(const File &file, const std::string &name) {
+    const std::string &info = file.GetExtendedInfo();
+    if (info.empty())
+        return file.ToString();
+    if (LowerCase(info).compare(0, kCalibrationPrefix.size(),
+                                kCalibrationPrefix) != 0)
+        return name;
+    std::string choice =
+        NormalizeCalibrationName(info.substr(kCalibrationPrefix.size()));
+    std::unique_ptr<File> plain = file.SetExtendedInfo("");
+    QueryComponents query;
+    query.AddPair(kCalibrationKey, choice);
+    std::unique_ptr<URI> base = plain->ToURI();
+    return URI(*base, query).ToString();
+}
+
+} // namespace
+
+std::string NormalizeCalibrationName(const std::string &text) {
+    std::string lower = LowerCase(text);
+    size_t found = lower.rfind("nought");
+    if (found != std::string::npos) {
+        size_t keep = found > 0 && lower[found - 1] == ' ' ? found - 1 : found;
+        lower.resize(keep);
+    }
+    if (!lower.empty())
+        lower[0] = static_cast<char>(
+            std::toupper(static_cast<unsigned char>(lower[0])));
+    return lower;
+}
+
+char *NormalizeDatasetName(const char *name) {
+    std::string text = name ? name : "";
+    std::unique_ptr<DataSource> source =
+        DataSourceFactory::GetInstance()->Create(text);
+    std::string normalized;
+    if (auto *uri = dynamic_cast<URI *>(source.get()))
+        normalized = NormalizeUriName(*uri);
+    else
+        normalized = NormalizeFileName(static_cast<File &>(*source), text);
+    return HString(normalized.c_str());
+}
+
+File ParseFileName(const std::string &name) {
+    try {
+        std::unique_ptr<DataSource> source =
+            DataSourceFactory::GetInstance()->Create(name);
+        if (auto *file = dynamic_cast<File *>(source.get()))
+            return *file;
+        if (auto *uri = dynamic_cast<URI *>(source.get()))
+            return File(*uri);
+    } catch (...) {
+        // Any failure to make a file of the name is the error below.
+    }
+    throw orv::Exception("Could not parse filename \"" + name + "\"", "", "",
+                         0);
+}

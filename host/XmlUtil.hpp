@@ -1,0 +1,41 @@
+#pragma once
+
+#include "host/Visibility.hpp"
+
+#include <string>
+
+#include <xercesc/util/XercesDefs.hpp>
+
+/// Counted set-up of the XML platform: pairs may nest, and the platform is
+/// really terminated when the last pair closes.
+class VXB_API ORV_XMLUtil {
+  public:
+    /// 1 when the platform is ready (then call Terminate once), 0 on failure.
+    static int Initialize();
+    static void Terminate();
+    /// Number of open Initialize calls (for diagnostics and tests).
+    static int InitializeCount();
+};
+
+/// Conversion between narrow UTF-8 text and the parser's XMLCh text.
+/// Built from narrow text it yields XMLCh text; built from XMLCh text it
+/// yields a std::string. An empty value yields empty texts. Malformed input
+/// (bytes that are not UTF-8, unpaired surrogates) converts each bad unit to
+/// U+FFFD. Needs no initialised XML platform.
+class VXB_API XmlTranscode {
+  public:
+    XmlTranscode() = default;
+    explicit XmlTranscode(const char *text);
+    explicit XmlTranscode(const std::string &text);
+    explicit XmlTranscode(const XMLCh *text);
+
+    const XMLCh *XmlText() const { return wide.c_str(); }
+    const std::string &Narrow() const { return narrow; }
+    operator const XMLCh *() const { return XmlText(); }
+    operator std::string() const { return narrow; }
+    bool Empty() const { return narrow.empty(); }
+
+  private:
+    std::basic_string<XMLCh> wide;
+    std::string narrow;
+};

@@ -1,0 +1,77 @@
+#pragma once
+
+#include "host/XmlUtil.hpp"
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <xercesc/dom/DOMDocument.hpp>
+#include <xercesc/dom/DOMElement.hpp>
+#include <xercesc/parsers/XercesDOMParser.hpp>
+
+class ElementIndex;
+
+/// A parsed XML file of a product. The document lives exactly as long as
+/// this object. A top-level parse (the product description) holds one XML
+/// platform initialisation, released once on every way out; a nested parse
+/// (look-up table files read while the description is parsed) runs under
+/// the initialisation already in force.
+class DocumentParse {
+  public:
+    enum class Platform { Initialize, AlreadyInitialized };
+
+    explicit DocumentParse(const char *path,
+                           Platform platform = Platform::Initialize);
+    ~DocumentParse();
+    DocumentParse(const DocumentParse &) = delete;
+    DocumentParse &operator=(const DocumentParse &) = delete;
+
+    /// The document, or null when the platform could not be initialised or
+    /// the parse gave no document.
+    xercesc::DOMDocument *Document() const { return document; }
+
+  private:
+    bool platformHeld = false;
+    std::unique_ptr<xercesc::XercesDOMParser> parser;
+    xercesc::DOMDocument *document = nullptr;
+    // The elements of the document by name, which the lookups below use
+    // instead of walking the whole document for each of them.
+    std::unique_ptr<ElementIndex> index;
+};
+
+/// Text of the first element of tag anywhere in the document, as a host
+/// string the caller frees; "" when there is none; null when document or
+/// tag is missing.
+char *ElementText(const xercesc::DOMDocument *document, const char *tag);
+/// The same text as an XmlTranscode value (empty when there is none).
+XmlTranscode ElementTextTranscoded(const xercesc::DOMDocument *document,
+                                   const char *tag);
+/// The elements of tag anywhere in the document, in document order (as the
+/// DOM's getElementsByTagName lists them); empty when document or tag is
+/// missing. Served from an index for documents of a DocumentParse.
+std::vector<const xercesc::DOMElement *>
+ElementsByTag(const xercesc::DOMDocument *document, const char *tag);
+/// The number of elements of tag anywhere in the document.
+std::size_t CountElementsByTag(const xercesc::DOMDocument *document,
+                               const char *tag);
+/// Text content of a node (all text below it, untrimmed), narrow.
+std::string NodeText(const xercesc::DOMNode *node);
+
+enum class AttributeMatch {
+    EqualIgnoringCase,    // the whole value equals the pattern
+    ContainsIgnoringCase, // the value contains the pattern
+};
+
+/// Text of the first element of tag (document order) with an attribute
+/// (attribute-map order) whose value matches pattern, as a host string the
+/// caller frees; null when none matches. matchedValue, when given, receives
+/// the matching attribute value as written.
+char *FindTextByAttribute(const xercesc::DOMDocument *document, const char *tag,
+                          AttributeMatch rule, const char *pattern,
+                          std::string *matchedValue = nullptr);
+
+/// Splits text at every one of the separator characters; empty tokens are
+/// kept (an empty text gives one empty token).
+std::vector<std::string> SplitTokens(const std::string &text,
+                                     const char *separators);

@@ -1,0 +1,103 @@
+#include "product/SideFile.hpp"
+
+#include "host/StringLists.hpp"
+#include "host/fileio/File.hpp"
+#include "product/DocumentAccess.hpp"
+#include "product/ProductReader.hpp"
+#include "product/StringListKeeper.hpp"
+
+#include <fstream>
+#include <iterator>
+#include <memory>
+#include <string>
+
+#include <boost/algorithm/string/trim.hpp>
+
+namespace {
+
+using orv::core::fileio::File;
+
+// Path of ProductDescription.self beside the product description; empty when
+// the product path gives no file name.
+std::string SideFilePath(const char *productPath) {
+    std::unique_ptr<File> product = File::Create(productPath);
+    if (!product)
+        return std::string();
+    std::unique_ptr<File> renamed = product->SetBasename("ProductDescription");
+    std::unique_ptr<File> sideFile = renamed->SetExtension("self");
+    return sideFile->GetFileName();
+}
+
+// The whole file; an unreadable file reads as empty.
+std::string ReadWholeFile(const std::string &path) {
+    std::ifstream stream(path);
+    if (!stream)
+        return std::string();
+    return std::string(std::istreambuf_iterator<char>(stream),
+                       std::istreambuf_iterator<char>());
+}
+
+// Lines that describe the archive's band layout, or that a conversion from
+// XML left behind, carry nothing for the metadata.
+bool IsIgnoredKey(const std::string &key) {
+    return key == "#text" || key == "bandsInArchive" || key == "bands";
+}
+
+// Two keys of the side file have names of their own in the host vocabulary.
+std::string HostKey(const std::string &key) {
+    if (key == "sourceInfo_startTime")
+        return "Acquisition_StartTime";
+    if (key == "sourceInfo_endTime")
+        return "Acquisition_EndTime";
+    return key;
+}
+
+// Turns "key = value;" lines into entries. A line with nothing after its '='
+// opens a section whose name prefixes the keys of the lines that follow.
+class SideFileParser {
+  public:
+    void ParseLine(std::string line) {
+        boost::algorithm::trim(line);
+        std::string::size_type equals = line.find('=');
+        if (equals == std::string::npos)
+            return;
+        std::string key = boost::algorithm::trim_copy(line.substr(0, equals));
+        if (IsIgnoredKey(key))
+            return;
+        std::string::size_type valueStart = equals + 1;
+        std::string::size_type semicolon = line.find(';', valueStart);
+        std::string value =
+            line.substr(valueStart, semicolon == std::string::npos
+                                        ? std::string::npos
+                                        : semicolon - valueStart);
+        if (value.empty()) {
+            section = key;
+            return;
+        }
+        boost::algorithm::trim(value);
+        std::string fullKey = section.empty() ? key : section + "_" + key;
+        entries.Set(HostKey(fullKey).c_str(), value.c_str());
+    }
+
+    char **Release() { return entries.Release(); }
+
+  private:
+    std::string section;
+    StringListKeeper entries;
+};
+
+} // namespace
+
+char **ReadSideFile(const ProductReader &reader) {
+    if (reader.productPath == nullptr)
+        return nullptr;
+    std::string path = SideFilePath(reader.productPath);
+    if (path.empty() || DKCheck(path.c_str()) == 0)
+        return nullptr;
+    SideFileParser parser;
+    for (std::string &line : SplitTokens(ReadWholeFile(path), "\n")) {
+        if (!line.empty())
+            parser.ParseLine(std::move(line));
+    }
+    return parser.Release();
+}

@@ -1,0 +1,15 @@
+productInfo=
+    productType = SGF;
+    productFormat = GeoTIFF;
+sourceInfo=
+    satellite = RADARSAT-2;
+    beamModeMnemonic = F2;
+    acquisitionType = Fine;
+    startTime = 2016-09-11T14:02:31.250000Z;
+    endTime = 2016-09-11T14:02:31.469669Z;
+    passDirection = Ascending;
+imageInfo=
+    numberOfLines = 240;
+    numberOfSamplesPerLine = 320;
+    bandsInArchive = 2;
+    bands = HH HV;

@@ -1,0 +1,612 @@
+#include "host/GeoTiffImage.hpp"
+#include "host/ErrorReports.hpp"
+#include "host/ModelSegments.hpp"
+#include "host/RasterServices.hpp"
+#include "tests/support/TempDir.hpp"
+#include "tests/support/TiffWriter.hpp"
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <limits>
+#include <memory>
+#include <sstream>
+#include <string>
+#include <vector>
+
+namespace {
+
+using host::GeoTiffImage;
+using host::ReportedError;
+using host::WindowRequest;
+using rs2test::TempDir;
+using rs2test::TiffSpec;
+
+constexpr uint32_t kWidth = 37;  // not a multiple of the 16-pixel tiles
+constexpr uint32_t kHeight = 29; // nor of the strip heights used
+
+// A pattern that differs between neighbours, lines and elements; each
+// format maps it onto its full range, signs included.
+uint64_t Pattern(uint32_t x, uint32_t y, uint32_t element) {
+    return uint64_t(x) * 37 + uint64_t(y) * 101 + uint64_t(element) * 53;
+}
+double UInt8Value(uint32_t x, uint32_t y, uint32_t e) {
+    return double(Pattern(x, y, e) % 256);
+}
+double Int8Value(uint32_t x, uint32_t y, uint32_t e) {
+    return UInt8Value(x, y, e) - 128;
+}
+double UInt16Value(uint32_t x, uint32_t y, uint32_t e) {
+    return double(Pattern(x, y, e) * 97 % 65536);
+}
+double Int16Value(uint32_t x, uint32_t y, uint32_t e) {
+    return UInt16Value(x, y, e) - 32768;
+}
+double UInt32Value(uint32_t x, uint32_t y, uint32_t e) {
+    return double(Pattern(x, y, e) * 2654435761u % 4294967296u);
+}
+double Int32Value(uint32_t x, uint32_t y, uint32_t e) {
+    return UInt32Value(x, y, e) - 2147483648.0;
+}
+double Float32Value(uint32_t x, uint32_t y, uint32_t e) {
+    return double(Pattern(x, y, e) % 4000) * 0.25 - 500.0;
+}
+
+struct FormatCase {
+    const char *name;
+    uint16_t bitsPerSample;
+    uint16_t sampleFormat;
+    double (*value)(uint32_t, uint32_t, uint32_t); // exact in the format
+    int32_t channelType;
+    int32_t channelsPerSample;
+};
+
+const FormatCase kFormats[] = {
+    {"uint8", 8, SAMPLEFORMAT_UINT, UInt8Value, kChanUInt8, 1},
+    {"int8", 8, SAMPLEFORMAT_INT, Int8Value, kChanInt16, 1},
+    {"uint16", 16, SAMPLEFORMAT_UINT, UInt16Value, kChanUInt16, 1},
+    {"int16", 16, SAMPLEFORMAT_INT, Int16Value, kChanInt16, 1},
+    {"uint32", 32, SAMPLEFORMAT_UINT, UInt32Value, kChanUInt32, 1},
+    {"int32", 32, SAMPLEFORMAT_INT, Int32Value, kChanInt32, 1},
+    {"float32", 32, SAMPLEFORMAT_IEEEFP, Float32Value, kChanFloat32, 1},
+    {"complex int16", 32, SAMPLEFORMAT_COMPLEXINT, Int16Value, kChanInt16, 2},
+    {"complex int32", 64, SAMPLEFORMAT_COMPLEXINT, Int32Value, kChanInt32, 2},
+};
+
+struct LayoutCase {
+    const char *name;
+    uint16_t planarConfig;
+    uint16_t compression;
+    uint16_t predictor;
+    uint32_t rowsPerStrip;
+    uint32_t tileSize; // tiled when non-zero
+    bool bigEndian;
+};
+
+constexpr uint16_t kContig = PLANARCONFIG_CONTIG;
+constexpr uint16_t kSeparate = PLANARCONFIG_SEPARATE;
+constexpr uint16_t kNone = COMPRESSION_NONE;
+constexpr uint16_t kDeflate = COMPRESSION_ADOBE_DEFLATE;
+
+// clang-format off
+const LayoutCase kLayouts[] = {
+    {"strips",                   kContig,   kNone,                PREDICTOR_NONE,       3, 0,  false},
+    {"separate strips",          kSeparate, kNone,                PREDICTOR_NONE,       4, 0,  false},
+    {"tiles",                    kContig,   kNone,                PREDICTOR_NONE,       0, 16, false},
+    {"separate tiles",           kSeparate, kNone,                PREDICTOR_NONE,       0, 16, false},
+    {"LZW strips",               kContig,   COMPRESSION_LZW,      PREDICTOR_NONE,       5, 0,  false},
+    {"LZW tiles with predictor", kContig,   COMPRESSION_LZW,      PREDICTOR_HORIZONTAL, 0, 16, false},
+    {"Deflate separate tiles",   kSeparate, kDeflate,             PREDICTOR_NONE,       0, 16, false},
+    {"PackBits strips",          kContig,   COMPRESSION_PACKBITS, PREDICTOR_NONE,       7, 0,  false},
+    {"big-endian strips",        kContig,   kNone,                PREDICTOR_NONE,       3, 0,  true},
+    {"big-endian Deflate separate tiles", kSeparate, kDeflate,    PREDICTOR_NONE,       0, 16, true},
+};
+// clang-format on
+
+TiffSpec SpecFor(const FormatCase &format, const LayoutCase &layout) {
+    TiffSpec spec;
+    spec.width = kWidth;
+    spec.height = kHeight;
+    spec.samplesPerPixel = 2;
+    spec.bitsPerSample = format.bitsPerSample;
+    spec.sampleFormat = format.sampleFormat;
+    spec.planarConfig = layout.planarConfig;
+    spec.compression = layout.compression;
+    spec.predictor = layout.predictor;
+    spec.rowsPerStrip = layout.rowsPerStrip;
+    spec.tileSize = layout.tileSize;
+    spec.bigEndian = layout.bigEndian;
+    return spec;
+}
+
+float ExpectedReal(double value) { return static_cast<float>(value); }
+
+int32_t ExpectedInt(double value) {
+    return static_cast<int32_t>(
+        std::clamp(std::round(value), -2147483648.0, 2147483647.0));
+}
+
+void Read(GeoTiffImage &image, const WindowRequest &window,
+          const std::vector<int32_t> &channels, float *out) {
+    image.ReadReal32(window, channels, out);
+}
+
+void Read(GeoTiffImage &image, const WindowRequest &window,
+          const std::vector<int32_t> &channels, int32_t *out) {
+    image.ReadInt32(window, channels, out);
+}
+
+// Reads a window and compares every output value with the value the file
+// was written from, at the pixel the resampling rule names.
+template <typename Out>
+void ExpectWindow(GeoTiffImage &image,
+                  double (*value)(uint32_t, uint32_t, uint32_t),
+                  Out (*expected)(double), const WindowRequest &w,
+                  const std::vector<int32_t> &channels) {
+    std::vector<Out> out(size_t(w.dstx) * w.dsty * channels.size());
+    Read(image, w, channels, out.data());
+    size_t mismatches = 0;
+    std::ostringstream first;
+    size_t i = 0;
+    for (int64_t j = 0; j < w.dsty; ++j) {
+        const auto y = static_cast<uint32_t>(w.yoff + j * w.ysize / w.dsty);
+        for (int64_t k = 0; k < w.dstx; ++k) {
+            const auto x = static_cast<uint32_t>(w.xoff + k * w.xsize / w.dstx);
+            for (int32_t channel : channels) {
+                const Out want = expected(value(x, y, channel - 1));
+                if (out[i] != want && mismatches++ == 0)
+                    first << "output (" << k << "," << j << ") channel "
+                          << channel << ": " << out[i] << " instead of "
+                          << want;
+                ++i;
+            }
+        }
+    }
+    EXPECT_EQ(mismatches, 0u) << first.str();
+}
+
+TEST(GeoTiffImage, windows_match_the_written_samples_in_every_layout) {
+    TempDir dir;
+    for (const FormatCase &format : kFormats) {
+        for (const LayoutCase &layout : kLayouts) {
+            SCOPED_TRACE(std::string(format.name) + ", " + layout.name);
+            const std::string path = dir.File("image.tif");
+            rs2test::WriteTiff(path, SpecFor(format, layout), format.value);
+            std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
+            const int32_t last = 2 * format.channelsPerSample;
+            ASSERT_EQ(image->ChannelCount(), last);
+            EXPECT_EQ(image->ChannelType(), format.channelType);
+            std::vector<int32_t> all;
+            for (int32_t c = 1; c <= last; ++c)
+                all.push_back(c);
+            const struct {
+                WindowRequest window;
+                std::vector<int32_t> channels;
+            } reads[] = {
+                {{0, 0, int32_t(kWidth), int32_t(kHeight), int32_t(kWidth),
+                  int32_t(kHeight)},
+                 all},
+                {{3, 2, 30, 25, 7, 6}, {last, 1, last}}, // down-sampled
+                {{5, 4, 6, 5, 17, 11}, {2, 2, 1}},       // up-sampled
+            };
+            for (const auto &read : reads) {
+                ExpectWindow(*image, format.value, ExpectedReal, read.window,
+                             read.channels);
+                ExpectWindow(*image, format.value, ExpectedInt, read.window,
+                             read.channels);
+            }
+        }
+    }
+}
+
+void Corrupt(const std::string &path, const std::vector<uint32_t> &blocks) {
+    const auto stored = rs2test::StoredBlocks(path);
+    std::fstream file(path, std::ios::in | std::ios::out | std::ios::binary);
+    for (uint32_t block : blocks) {
+        file.seekp(std::streamoff(stored.at(block).first));
+        file << std::string(stored.at(block).second, '\xFF');
+    }
+}
+
+template <typename Out> std::vector<Out> Sentinels(size_t count) {
+    return std::vector<Out>(count, Out(-12345));
+}
+
+// Room for the output of a sane request, so that a read that writes when it
+// should not is caught by the sentinels rather than by a crash.
+size_t SentinelCount(const WindowRequest &window, size_t channels) {
+    const double needed = double(std::max(window.dstx, 1)) *
+                          std::max(window.dsty, 1) *
+                          double(std::max<size_t>(channels, 1));
+    return needed <= 1e6 ? std::max<size_t>(64, size_t(needed)) : 64;
+}
+
+void ExpectReadFailsWritingNothing(GeoTiffImage &image,
+                                   const WindowRequest &window,
+                                   const std::vector<int32_t> &channels) {
+    const size_t count = SentinelCount(window, channels.size());
+    std::vector<float> reals = Sentinels<float>(count);
+    std::vector<int32_t> ints = Sentinels<int32_t>(count);
+    EXPECT_THROW(image.ReadReal32(window, channels, reals.data()),
+                 ReportedError);
+    EXPECT_THROW(image.ReadInt32(window, channels, ints.data()), ReportedError);
+    EXPECT_EQ(reals, Sentinels<float>(count));
+    EXPECT_EQ(ints, Sentinels<int32_t>(count));
+}
+
+TEST(GeoTiffImage, decodes_only_the_blocks_a_window_needs) {
+    struct Case {
+        const char *what;
+        uint32_t rowsPerStrip;
+        uint32_t tileSize;
+        std::vector<uint32_t> corrupted; // blocks overwritten with garbage
+        WindowRequest avoiding;          // samples none of them
+        WindowRequest needing;           // samples some of them
+    };
+    const Case cases[] = {
+        {"odd strips",
+         1,
+         0,
+         {1, 3, 5, 7, 9, 11, 13, 15, 17, 19, 21, 23, 25, 27},
+         {0, 0, 37, 28, 37, 14},
+         {0, 0, 37, 29, 37, 29}},
+        {"middle tile column",
+         0,
+         16,
+         {1, 4},
+         {32, 0, 5, 29, 5, 29},
+         {10, 0, 10, 5, 10, 5}},
+    };
+    TempDir dir;
+    for (const Case &c : cases) {
+        SCOPED_TRACE(c.what);
+        const LayoutCase layout = {c.what,         kContig,        kDeflate,
+                                   PREDICTOR_NONE, c.rowsPerStrip, c.tileSize,
+                                   false};
+        const FormatCase &format = kFormats[2];
+        const std::string path = dir.File("corrupt.tif");
+        rs2test::WriteTiff(path, SpecFor(format, layout), format.value);
+        Corrupt(path, c.corrupted);
+        std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
+        ExpectWindow(*image, format.value, ExpectedReal, c.avoiding, {2, 1});
+        ExpectReadFailsWritingNothing(*image, c.needing, {2, 1});
+    }
+}
+
+TEST(GeoTiffImage, refuses_bad_requests_without_writing) {
+    TempDir dir;
+    const std::string path = dir.File("image.tif");
+    rs2test::WriteTiff(path, SpecFor(kFormats[2], kLayouts[0]),
+                       kFormats[2].value);
+    std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
+    const int32_t big = std::numeric_limits<int32_t>::max();
+    struct Case {
+        const char *what;
+        WindowRequest window;
+        std::vector<int32_t> channels;
+    };
+    const Case cases[] = {
+        {"left of the image", {-1, 0, 5, 5, 5, 5}, {1}},
+        {"above the image", {0, -1, 5, 5, 5, 5}, {1}},
+        {"past the right edge", {33, 0, 5, 5, 5, 5}, {1}},
+        {"past the bottom", {0, 25, 5, 5, 5, 5}, {1}},
+        {"offset overflowing int32", {big, 0, big, 5, 5, 5}, {1}},
+        {"zero width", {0, 0, 0, 5, 5, 5}, {1}},
+        {"negative height", {0, 0, 5, -2, 5, 5}, {1}},
+        {"zero output width", {0, 0, 5, 5, 0, 5}, {1}},
+        {"negative output height", {0, 0, 5, 5, 5, -1}, {1}},
+        {"channel 0", {0, 0, 5, 5, 5, 5}, {1, 0}},
+        {"channel past the last", {0, 0, 5, 5, 5, 5}, {3}},
+        {"negative channel", {0, 0, 5, 5, 5, 5}, {-1}},
+        {"no channel", {0, 0, 5, 5, 5, 5}, {}},
+        {"output beyond addressable memory",
+         {0, 0, 5, 5, big, big},
+         {1, 1, 1, 1}},
+    };
+    for (const Case &c : cases) {
+        SCOPED_TRACE(c.what);
+        ExpectReadFailsWritingNothing(*image, c.window, c.channels);
+    }
+    try {
+        image->ReadReal32({0, 0, 0, 1, 1, 1}, {1}, nullptr);
+        ADD_FAILURE() << "a null output buffer was accepted";
+    } catch (const ReportedError &error) {
+        EXPECT_EQ(error.reportClass, host::kError);
+        EXPECT_NE(std::string(error.what()).find(path), std::string::npos);
+    }
+    EXPECT_THROW(image->ReadInt32({0, 0, 5, 5, 5, 5}, {1}, nullptr),
+                 ReportedError);
+}
+
+void WriteText(const std::string &path, const std::string &text) {
+    std::ofstream(path, std::ios::binary) << text;
+}
+
+TEST(GeoTiffImage, refuses_files_it_cannot_decode) {
+    struct Case {
+        const char *what;
+        uint16_t bitsPerSample;
+        uint16_t sampleFormat;
+        uint16_t photometric;
+    };
+    const Case cases[] = {
+        {"1-bit samples", 1, SAMPLEFORMAT_UINT, PHOTOMETRIC_MINISBLACK},
+        {"12-bit samples", 12, SAMPLEFORMAT_UINT, PHOTOMETRIC_MINISBLACK},
+        {"64-bit floats", 64, SAMPLEFORMAT_IEEEFP, PHOTOMETRIC_MINISBLACK},
+        {"complex floats", 64, SAMPLEFORMAT_COMPLEXIEEEFP,
+         PHOTOMETRIC_MINISBLACK},
+        {"complex 8-bit integers", 16, SAMPLEFORMAT_COMPLEXINT,
+         PHOTOMETRIC_MINISBLACK},
+        {"subsampled YCbCr", 8, SAMPLEFORMAT_UINT, PHOTOMETRIC_YCBCR},
+    };
+    TempDir dir;
+    for (const Case &c : cases) {
+        SCOPED_TRACE(c.what);
+        TiffSpec spec;
+        spec.width = 16;
+        spec.height = 16;
+        spec.bitsPerSample = c.bitsPerSample;
+        spec.sampleFormat = c.sampleFormat;
+        spec.photometric = c.photometric;
+        spec.samplesPerPixel = c.photometric == PHOTOMETRIC_YCBCR ? 3 : 1;
+        spec.rowsPerStrip = 16;
+        const std::string path = dir.File("unsupported.tif");
+        rs2test::WriteTiff(path, spec, UInt8Value);
+        EXPECT_TRUE(host::HasTiffSignature(path));
+        try {
+            GeoTiffImage::Open(path);
+            ADD_FAILURE() << "opened";
+        } catch (const ReportedError &error) {
+            EXPECT_NE(std::string(error.what()).find(path), std::string::npos)
+                << error.what();
+        }
+    }
+    const std::string text = dir.File("notes.tif");
+    WriteText(text, "this is not an image\n"); // no TIFF signature
+    EXPECT_FALSE(host::HasTiffSignature(text));
+    EXPECT_THROW(GeoTiffImage::Open(text), ReportedError);
+    const std::string empty = dir.File("empty.tif");
+    WriteText(empty, ""); // no bytes at all
+    EXPECT_FALSE(host::HasTiffSignature(empty));
+    EXPECT_THROW(GeoTiffImage::Open(empty), ReportedError);
+    EXPECT_THROW(GeoTiffImage::Open(dir.File("missing.tif")), ReportedError);
+}
+
+TEST(GeoTiffImage, truncated_file_fails_to_open_or_to_read) {
+    TempDir dir;
+    const std::string path = dir.File("cut.tif");
+    rs2test::WriteTiff(path, SpecFor(kFormats[3], kLayouts[5]),
+                       kFormats[3].value);
+    // The second half, with the directory libtiff writes last, is gone.
+    std::filesystem::resize_file(path, std::filesystem::file_size(path) / 2);
+    std::unique_ptr<GeoTiffImage> image;
+    try {
+        image = GeoTiffImage::Open(path);
+    } catch (const ReportedError &error) {
+        EXPECT_NE(std::string(error.what()).find(path), std::string::npos);
+        return;
+    }
+    ExpectReadFailsWritingNothing(*image, {0, 0, 37, 29, 37, 29}, {1, 2});
+}
+
+// A little-endian 8-bit TIFF written byte by byte, in two strips of which
+// the second starts at the end of the file: its data is missing.
+void WriteTiffMissingSecondStrip(const std::string &path, uint16_t width,
+                                 uint16_t height) {
+    const uint32_t stripBytes = uint32_t(width) * height / 2;
+    const uint32_t arrays = 8 + 2 + 9 * 12 + 4; // after header and directory
+    const uint32_t data = arrays + 16;
+    std::string bytes = "II";
+    auto put16 = [&bytes](uint32_t v) {
+        bytes += char(v & 0xFF);
+        bytes += char((v >> 8) & 0xFF);
+    };
+    auto put32 = [&put16](uint32_t v) {
+        put16(v & 0xFFFF);
+        put16(v >> 16);
+    };
+    auto entry = [&](uint16_t tag, uint16_t type, uint32_t count,
+                     uint32_t value) {
+        put16(tag);
+        put16(type);
+        put32(count);
+        put32(value); // a SHORT value sits in the low half
+    };
+    put16(42);
+    put32(8);
+    put16(9);
+    entry(256, 3, 1, width);
+    entry(257, 3, 1, height);
+    entry(258, 3, 1, 8);
+    entry(259, 3, 1, 1);
+    entry(262, 3, 1, 1);
+    entry(273, 4, 2, arrays);
+    entry(277, 3, 1, 1);
+    entry(278, 3, 1, height / 2u);
+    entry(279, 4, 2, arrays + 8);
+    put32(0);
+    put32(data);
+    put32(data + stripBytes);
+    put32(stripBytes);
+    put32(stripBytes);
+    for (uint32_t i = 0; i < stripBytes; ++i)
+        bytes += char(i % 251);
+    WriteText(path, bytes);
+}
+
+TEST(GeoTiffImage, missing_uncompressed_strip_is_refused_before_writing) {
+    TempDir dir;
+    const std::string path = dir.File("short.tif");
+    WriteTiffMissingSecondStrip(path, 10, 8);
+    std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
+    ExpectWindow(
+        *image,
+        +[](uint32_t x, uint32_t y, uint32_t) { return double(y * 10 + x); },
+        ExpectedInt, {0, 0, 10, 4, 10, 4}, {1});
+    ExpectReadFailsWritingNothing(*image, {0, 0, 10, 8, 10, 8}, {1});
+}
+
+// GeoKeyDirectory entries (key, value) of the georeferencing cases.
+std::vector<uint16_t> GeographicKeys(uint16_t gcs, uint16_t rasterType = 1) {
+    return {1024, 2, 1025, rasterType, 2048, gcs}; // model type geographic
+}
+std::vector<uint16_t> ProjectedKeys(uint16_t pcs) {
+    return {1024, 1, 1025, 1, 3072, pcs}; // model type projected, area
+}
+constexpr uint16_t kPixelIsPoint = 2;
+
+using Transform = std::array<double, 6>;
+constexpr Transform kIdentity = {0, 1, 0, 0, 0, 1};
+
+TEST(GeoTiffImage, georeferencing_gives_the_system_transform_and_tie_points) {
+    struct Case {
+        const char *what;
+        std::vector<uint16_t> keys;
+        std::vector<double> pixelScale, tiePoints, matrix;
+        const char *geosys;
+        Transform transform;
+        const char *tieGeosys;
+        std::array<double, 2> utmParms; // zone, hemisphere (UTM only)
+    };
+    const std::vector<double> cornerTie = {0, 0, 0, -120.5, 45.25, 0};
+    const std::vector<double> scale = {0.001, 0.002, 0};
+    const std::vector<double> fourTies = {
+        0, 0,  0, -120.0, 45.0, 10, 36, 0,  0, -119.9, 45.0, 11,
+        0, 28, 0, -120.0, 44.9, 12, 36, 28, 0, -119.9, 44.9, 13};
+    const std::vector<double> rotated = {0.001,  0.0002, 0, -120, // X row
+                                         0.0001, -0.002, 0, 45,   // Y row
+                                         0,      0,      0, 0,    // Z row
+                                         0,      0,      0, 1};
+    // clang-format off
+    const Case cases[] = {
+        {"geographic with pixel scale", GeographicKeys(4326), scale, cornerTie, {},
+         "LONG D000", {-120.5, 0.001, 0, 45.25, 0, -0.002}, "LONG D000", {}},
+        {"tie point inside the image", GeographicKeys(4326), scale, {10, 20, 0, -120.5, 45.25, 0}, {},
+         "LONG D000", {-120.51, 0.001, 0, 45.29, 0, -0.002}, "LONG D000", {}},
+        {"pixel is point", GeographicKeys(4326, kPixelIsPoint), scale, cornerTie, {},
+         "LONG D000", {-120.5005, 0.001, 0, 45.251, 0, -0.002}, "LONG D000", {}},
+        {"rotated transformation matrix", GeographicKeys(4326), {}, {}, rotated,
+         "LONG D000", {-120, 0.001, 0.0002, 45, 0.0001, -0.002}, "LONG D000", {}},
+        {"UTM north", ProjectedKeys(32610), {10, 10, 0}, {0, 0, 0, 500000, 5000000, 0}, {},
+         "UTM 10 T D000", {500000, 10, 0, 5000000, 0, -10}, "UTM 10 T D000", {10, 1}},
+        {"UTM south", ProjectedKeys(32733), {10, 10, 0}, {0, 0, 0, 500000, 7000000, 0}, {},
+         "UTM 33 J D000", {500000, 10, 0, 7000000, 0, -10}, "UTM 33 J D000", {33, -1}},
+        {"UTM north, centre south of the equator", ProjectedKeys(32631), {10, 10, 0}, {0, 0, 0, 500000, 100, 0}, {},
+         "UTM 31 N D000", {500000, 10, 0, 100, 0, -10}, "UTM 31 N D000", {31, 1}},
+        {"tie points only", GeographicKeys(4326), {}, fourTies, {},
+         "PIXEL", kIdentity, "LONG D000", {}},
+        {"UTM tie points only", ProjectedKeys(32610), {}, {0, 0, 0, 500000, 5000000, 0, 36, 28, 0, 500360, 4999720, 0}, {},
+         "PIXEL", kIdentity, "UTM 10 T D000", {}},
+        {"unsupported projection", ProjectedKeys(3857), {10, 10, 0}, {0, 0, 0, 500000, 100, 0}, {},
+         "PIXEL", kIdentity, "PIXEL", {}},
+        {"another datum", GeographicKeys(4267), scale, cornerTie, {},
+         "PIXEL", kIdentity, "PIXEL", {}},
+        {"no georeferencing", {}, {}, {}, {},
+         "PIXEL", kIdentity, "PIXEL", {}},
+    };
+    // clang-format on
+    TempDir dir;
+    for (const Case &c : cases) {
+        SCOPED_TRACE(c.what);
+        TiffSpec spec = SpecFor(kFormats[0], kLayouts[0]);
+        spec.geoKeys = c.keys;
+        spec.pixelScale = c.pixelScale;
+        spec.tiePoints = c.tiePoints;
+        spec.transformMatrix = c.matrix;
+        const std::string path = dir.File("geo.tif");
+        rs2test::WriteTiff(path, spec, UInt8Value);
+        std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
+        const ProjInfo_t projection = image->Projection();
+        EXPECT_STREQ(projection.geosys, c.geosys);
+        for (int i = 0; i < 6; ++i)
+            EXPECT_NEAR(projection.transform[i], c.transform[i], 1e-9)
+                << "coefficient " << i;
+        if (DecodeGeosys(c.geosys, nullptr) == kGeosysUTM) {
+            EXPECT_EQ(projection.parms[0], c.utmParms[0]);
+            EXPECT_EQ(projection.parms[1], c.utmParms[1]);
+        }
+        EXPECT_EQ(image->TiePointGeosys(), c.tieGeosys);
+        const std::vector<host::TiePoint> &ties = image->TiePoints();
+        ASSERT_EQ(ties.size(), c.tiePoints.size() / 6);
+        for (size_t i = 0; i < ties.size(); ++i) {
+            const double *t = &c.tiePoints[6 * i];
+            EXPECT_EQ(ties[i].pixel, t[0]);
+            EXPECT_EQ(ties[i].line, t[1]);
+            EXPECT_EQ(ties[i].x, t[3]);
+            EXPECT_EQ(ties[i].y, t[4]);
+            EXPECT_EQ(ties[i].z, t[5]);
+        }
+        EXPECT_TRUE(image->RpcBlock().empty());
+    }
+}
+
+struct RecordKeeper {
+    void operator()(RFInfo_t *record) const { RFDeallocate(record); }
+};
+
+std::vector<double> RpcValues() {
+    std::vector<double> values(92);
+    for (size_t i = 0; i < values.size(); ++i)
+        values[i] = 0.5 + double(i);
+    return values;
+}
+
+std::unique_ptr<GeoTiffImage> OpenWithRpc(const TempDir &dir,
+                                          const std::vector<double> &values) {
+    TiffSpec spec = SpecFor(kFormats[2], kLayouts[0]);
+    spec.rpcCoefficients = values;
+    const std::string path = dir.File("rpc.tif");
+    rs2test::WriteTiff(path, spec, UInt16Value);
+    return GeoTiffImage::Open(path);
+}
+
+TEST(GeoTiffImage, rpc_tag_becomes_an_rf_block) {
+    TempDir dir;
+    const std::vector<double> v = RpcValues();
+    std::unique_ptr<GeoTiffImage> image = OpenWithRpc(dir, v);
+    const std::vector<unsigned char> &block = image->RpcBlock();
+    ASSERT_EQ(block.size(), size_t(kRFBlockSize));
+    std::unique_ptr<RFInfo_t, RecordKeeper> record(
+        VXBBinaryToRFInfo(block.data(), int32_t(block.size())));
+    ASSERT_NE(record, nullptr);
+    EXPECT_EQ(record->width, int32_t(kWidth));
+    EXPECT_EQ(record->height, int32_t(kHeight));
+    const std::pair<double, double> scalars[] = {
+        {record->lineOffset, v[2]},      {record->pixelOffset, v[3]},
+        {record->latitudeOffset, v[4]},  {record->longitudeOffset, v[5]},
+        {record->heightOffset, v[6]},    {record->lineScale, v[7]},
+        {record->pixelScale, v[8]},      {record->latitudeScale, v[9]},
+        {record->longitudeScale, v[10]}, {record->heightScale, v[11]},
+    };
+    for (const auto &[got, want] : scalars)
+        EXPECT_EQ(got, want);
+    for (int i = 0; i < 20; ++i) {
+        EXPECT_EQ(record->lineNumeratorCoefficients[i], v[12 + i]);
+        EXPECT_EQ(record->lineDenominatorCoefficients[i], v[32 + i]);
+        EXPECT_EQ(record->pixelNumeratorCoefficients[i], v[52 + i]);
+        EXPECT_EQ(record->pixelDenominatorCoefficients[i], v[72 + i]);
+    }
+    EXPECT_STREQ(record->geosys, "LONG D000");
+    EXPECT_STREQ(record->projection->geosys, "PIXEL");
+}
+
+TEST(GeoTiffImage, malformed_rpc_tag_gives_no_block) {
+    std::vector<double> shortTag = RpcValues();
+    shortTag.pop_back(); // 91 values
+    std::vector<double> zeroScale = RpcValues();
+    zeroScale[8] = 0.0; // SAMP_SCALE 0 would divide by zero
+    std::vector<double> notANumber = RpcValues();
+    notANumber[40] = std::nan(""); // a LINE_DEN coefficient
+    TempDir dir;
+    for (const auto &values : {shortTag, zeroScale, notANumber}) {
+        SCOPED_TRACE(values.size());
+        EXPECT_TRUE(OpenWithRpc(dir, values)->RpcBlock().empty());
+    }
+}
+
+} // namespace

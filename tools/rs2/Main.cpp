@@ -1,0 +1,29 @@
+#include "tools/rs2/Commands.hpp"
+
+#include "host/Raster.hpp"
+
+#include <cstdio>
+#include <exception>
+#include <iostream>
+
+int main(int argc, char **argv) {
+    CLI::App app{"rs2: inspect, read and export RADARSAT-2 products"};
+    app.set_version_flag("--version", std::string("rs2 ") + RS2_VERSION);
+    app.require_subcommand(1);
+    AddInfoCommand(app);
+    AddReadCommand(app);
+    AddTextCommands(app);
+    AddDriverCommand(app);
+    AddSampleCommand(app);
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::ParseError &error) {
+        // Help and version are successes; any other parse error is bad usage.
+        int code = app.exit(error);
+        return code == 0 ? 0 : 2;
+    } catch (const std::exception &error) {
+        std::cerr << "rs2: " << error.what() << "\n";
+        return 1;
+    }
+    return 0;
+}

@@ -1,0 +1,28 @@
+#include "tools/rs2/Commands.hpp"
+
+#include "host/Raster.hpp"
+
+#include <cstdio>
+
+void AddTextCommands(CLI::App &app) {
+    static std::string textName;
+    CLI::App *text = app.add_subcommand(
+        "text", "Print the product annotation segment line by line");
+    text->add_option("NAME", textName, "dataset name")->required();
+    text->callback([] {
+        host::Raster raster = host::OpenRaster(textName);
+        for (const std::string &line : raster.TextLines())
+            std::printf("%s\n", line.c_str());
+    });
+
+    static std::string segmentsName;
+    CLI::App *segments =
+        app.add_subcommand("segments", "List the segments of a dataset");
+    segments->add_option("NAME", segmentsName, "dataset name")->required();
+    segments->callback([] {
+        host::Raster raster = host::OpenRaster(segmentsName);
+        for (const host::Segment &segment : raster.Segments())
+            std::printf("%d %d %s\n", segment.type, segment.number,
+                        segment.description.c_str());
+    });
+}
