@@ -55,12 +55,14 @@ std::string NormalizeFileName(const File &file, const std::string &name) {
 } // namespace
 
 std::string NormalizeCalibrationName(const std::string &text) {
+    // Only names spelled with "nought" are shortened and capitalised
+    // ("Sigma Nought" -> "Sigma"); others stay lower-cased ("Gamma" ->
+    // "gamma").
     std::string lower = LowerCase(text);
     size_t found = lower.rfind("nought");
-    if (found != std::string::npos) {
-        size_t keep = found > 0 && lower[found - 1] == ' ' ? found - 1 : found;
-        lower.resize(keep);
-    }
+    if (found == std::string::npos)
+        return lower;
+    lower.resize(found > 0 && lower[found - 1] == ' ' ? found - 1 : found);
     if (!lower.empty())
         lower[0] = static_cast<char>(
             std::toupper(static_cast<unsigned char>(lower[0])));

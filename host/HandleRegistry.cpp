@@ -34,4 +34,6 @@ std::unique_ptr<RasterHandle> UnregisterHandle(FILE *fp) {
     return handle;
 }
 
+size_t LiveHandleCount() { return Registry().size(); }
+
 } // namespace host
