@@ -7,27 +7,98 @@
 
 namespace {
 
-void PrintSummary(const nlohmann::json &info) {
+using nlohmann::json;
+
+// The value of a metadata entry, or "" when the dataset has none.
+std::string Entry(const json &info, const std::string &key) {
+    for (const auto &pair : info["metadata"])
+        if (pair[0] == key)
+            return pair[1];
+    return "";
+}
+
+void Heading(const char *title) { std::printf("\n%s\n", title); }
+
+void Row(const std::string &label, const std::string &value) {
+    if (!value.empty())
+        std::printf("  %-22s %s\n", label.c_str(), value.c_str());
+}
+
+void RowsFromEntries(
+    const json &info,
+    const std::vector<std::pair<const char *, const char *>> &labelsAndKeys) {
+    for (const auto &[label, key] : labelsAndKeys)
+        Row(label, Entry(info, key));
+}
+
+std::string Join(const json &list, const char *separator) {
+    std::string text;
+    for (const auto &item : list)
+        text += (text.empty() ? "" : separator) + item.get<std::string>();
+    return text;
+}
+
+void PrintSummary(const json &info) {
     std::printf("%s\n", info["name"].get<std::string>().c_str());
-    std::printf("  %s, %d x %d pixels, %zu channel(s)\n",
-                info["object_name"].get<std::string>().c_str(),
-                info["width"].get<int>(), info["height"].get<int>(),
-                info["channels"].size());
+    Heading("Product");
+    RowsFromEntries(info, {{"type", "ProductType"},
+                           {"id", "productId"},
+                           {"platform", "PlatformName"},
+                           {"beam mode", "BeamMode"},
+                           {"acquisition", "Acquisition_Type"},
+                           {"polarizations", "Polarizations"},
+                           {"matrix", "Matrix_Type"}});
+    Heading("Acquisition");
+    RowsFromEntries(info, {{"date and time", "Acquisition_DateTime"},
+                           {"first line", "TimeOfFirstLine"},
+                           {"last line", "TimeOfLastLine"},
+                           {"orbit direction", "OrbitDirection"},
+                           {"look direction", "LookDirection"},
+                           {"wavelength (m)", "RadarCenterWavelength"}});
+    Heading("Geometry");
+    Row("size", std::to_string(info["width"].get<int>()) + " x " +
+                    std::to_string(info["height"].get<int>()) + " pixels");
+    Row("looks (range x az.)",
+        Entry(info, "NumRangeLooks") + " x " + Entry(info, "NumAzimuthLooks"));
+    RowsFromEntries(info, {{"pixel spacing (m)", "SpatialResolutionX"},
+                           {"line spacing (m)", "SpatialResolutionY"},
+                           {"incidence near (deg)", "IncidenceNearAngle"},
+                           {"incidence far (deg)", "IncidenceFarAngle"},
+                           {"slant range near (m)", "SlantRangeNearEdge"},
+                           {"slant range far (m)", "SlantRangeFarEdge"}});
+    Heading("Calibration");
+    RowsFromEntries(info, {{"applied", "SAR_Calibration"}});
+    std::string offered;
+    for (const auto &type : info["calibration_types"]) {
+        // Entries read ":Calibration Type:<kind>"; people want the kind.
+        std::string text = type.get<std::string>();
+        size_t colon = text.rfind(':');
+        offered += (offered.empty() ? "" : ", ") + text.substr(colon + 1);
+    }
+    Row("offered", offered);
+    Heading("Channels");
     for (const auto &channel : info["channels"])
-        std::printf("  channel %d: type %d, %s\n", channel["number"].get<int>(),
-                    channel["type"].get<int>(),
-                    channel["description"].get<std::string>().c_str());
-    std::printf("  projection: %s\n",
-                info["projection"]["geosys"].get<std::string>().c_str());
-    std::printf("  ground control points: %zu\n",
-                info["gcps"]["points"].size());
+        Row("channel " + std::to_string(channel["number"].get<int>()),
+            channel["description"].get<std::string>() + " (type " +
+                std::to_string(channel["type"].get<int>()) + ")");
+    Heading("Georeferencing");
+    Row("coordinate system", info["projection"]["geosys"]);
+    Row("ground control points", std::to_string(info["gcps"]["points"].size()));
+    Row("RPC model", info["rpc"].is_null() ? "none" : "yes");
+    Row("orbit state vectors",
+        info["orbit"].is_null()
+            ? "none"
+            : std::to_string(info["orbit"]["state_vectors"].size()));
+    Heading("Segments");
     for (const auto &segment : info["segments"])
-        std::printf("  segment %d/%d: %s\n", segment["type"].get<int>(),
-                    segment["number"].get<int>(),
-                    segment["description"].get<std::string>().c_str());
-    std::printf("  metadata entries: %zu\n", info["metadata"].size());
+        Row(std::to_string(segment["type"].get<int>()),
+            segment["description"].get<std::string>());
+    Heading("Files");
+    Row("images", Join(info["files"]["images"], ", "));
+    Row("browse", info["files"]["browse"]);
+    Row("auxiliary", Join(info["files"]["auxiliary"], ", "));
     for (const auto &warning : info["warnings"])
-        std::printf("  warning: %s\n", warning.get<std::string>().c_str());
+        std::printf("warning: %s\n", warning.get<std::string>().c_str());
 }
 
 } // namespace
