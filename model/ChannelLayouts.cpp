@@ -65,22 +65,6 @@ std::pair<Polarization, Polarization> DualPair(const ZirOdi2CalibImage &model) {
     return {Polarization::VV, Polarization::VH};
 }
 
-const char *PolarizationName(int32_t code) {
-    switch (static_cast<Polarization>(code)) {
-    case Polarization::HH:
-        return "HH";
-    case Polarization::VH:
-        return "VH";
-    case Polarization::HV:
-        return "HV";
-    case Polarization::VV:
-        return "VV";
-    case Polarization::Unknown:
-        break;
-    }
-    return "Unknown";
-}
-
 // The gain of product column index; columns before the first have no entry
 // and take the neutral gain, as those past the last do.
 float ColumnGain(const LookupTable &table, int64_t index) {

@@ -45,3 +45,7 @@ enum class SampleKind : int32_t {
     Detected = 0, // one real sample per pixel
     Complex = 2,  // an in-phase/quadrature pair per pixel
 };
+
+/// Name of a Polarization code ("HH", "VH", "HV", "VV", else "Unknown"); a
+/// static text, never freed.
+const char *PolarizationName(int32_t polarization);

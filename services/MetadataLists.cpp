@@ -43,21 +43,6 @@ char *ProductTypeName(int32_t productType) {
                                                            : "UNKNOWN");
 }
 
-const char *PolarizationName(int32_t polarization) {
-    switch (static_cast<Polarization>(polarization)) {
-    case Polarization::HH:
-        return "HH";
-    case Polarization::VH:
-        return "VH";
-    case Polarization::HV:
-        return "HV";
-    case Polarization::VV:
-        return "VV";
-    default:
-        return "Unknown";
-    }
-}
-
 char *CalibrationShortName(const char *calibrationType) {
     static const struct {
         const char *type;

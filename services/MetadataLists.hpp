@@ -9,9 +9,6 @@
 /// Name of a ProductType value ("SLC" ... "SPG", else "UNKNOWN") as a new
 /// host string; the caller frees it with free().
 char *ProductTypeName(int32_t productType);
-/// Name of a Polarization code ("HH", "VH", "HV", "VV", else "Unknown"); a
-/// static text, never freed.
-const char *PolarizationName(int32_t polarization);
 /// Short name of a calibration type ("Beta Nought" -> "Beta0", "Sigma
 /// Nought" -> "Sigma0", "Gamma", "None"; any case) as a new host string the
 /// caller frees with free(); null for any other text or null.
