@@ -20,8 +20,7 @@ bool DatasetEntry::Load(const char *path, const char *calibrationOption) {
 void DatasetEntry::ReadIntegerChannels(int32_t mode, int32_t xOffset,
                                        int32_t yOffset, int32_t xSize,
                                        int32_t ySize, int32_t *buffer,
-                                       int32_t bufferXSize,
-                                       int32_t bufferYSize,
+                                       int32_t bufferXSize, int32_t bufferYSize,
                                        int32_t channelCount,
                                        const int32_t *channelList) {
     model->ReadIntegerChannels(mode, xOffset, yOffset, xSize, ySize, buffer,
@@ -71,8 +70,8 @@ void DatasetEntry::GcpSegment(int32_t *count, char *pixelUnits,
                               double *longitudes, double *latitudes,
                               double *heights) {
     model->GcpSegment(count, pixelUnits, groundGeosys, elevationUnits,
-                      groundUnits, ids, pixels, lines, pixelHeights,
-                      longitudes, latitudes, heights);
+                      groundUnits, ids, pixels, lines, pixelHeights, longitudes,
+                      latitudes, heights);
 }
 
 EphemerisSeg_t *DatasetEntry::GetOrbit() { return model->GetOrbit(); }

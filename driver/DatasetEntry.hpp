@@ -27,8 +27,7 @@ class DatasetEntry {
     void ReadIntegerChannels(int32_t mode, int32_t xOffset, int32_t yOffset,
                              int32_t xSize, int32_t ySize, int32_t *buffer,
                              int32_t bufferXSize, int32_t bufferYSize,
-                             int32_t channelCount,
-                             const int32_t *channelList);
+                             int32_t channelCount, const int32_t *channelList);
     void ReadRealChannels(int32_t mode, int32_t xOffset, int32_t yOffset,
                           int32_t xSize, int32_t ySize, float *buffer,
                           int32_t bufferXSize, int32_t bufferYSize,

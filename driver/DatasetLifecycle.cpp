@@ -49,8 +49,9 @@ ResolvedName ResolveName(const std::string &canonical) {
     if (auto *uri = dynamic_cast<URI *>(source.get()))
         return {File(*uri).SetExtendedInfo("")->GetNormalizedName(),
                 uri->GetFirstValue("c")};
-    return {static_cast<File &>(*source).SetExtendedInfo("")->GetNormalizedName(),
-            ""};
+    return {
+        static_cast<File &>(*source).SetExtendedInfo("")->GetNormalizedName(),
+        ""};
 }
 
 std::string LowerCase(std::string text) {
@@ -60,8 +61,8 @@ std::string LowerCase(std::string text) {
 }
 
 void RequireValidChoice(const std::string &choice) {
-    static const std::array<const char *, 5> kAccepted = {
-        "", "beta", "gamma", "none", "sigma"};
+    static const std::array<const char *, 5> kAccepted = {"", "beta", "gamma",
+                                                          "none", "sigma"};
     for (const char *accepted : kAccepted)
         if (choice == accepted)
             return;

@@ -80,8 +80,8 @@ char **ListAuxiliaryFiles(FILE *handle) {
     std::string choice = location.choice;
     if (size_t space = choice.find(' '); space != std::string::npos)
         choice[space] = '_';
-    list = AddIfPresent(list,
-                        location.directory + "product.xml_c_" + choice + ".pox");
+    list = AddIfPresent(list, location.directory + "product.xml_c_" + choice +
+                                  ".pox");
     return AddIfPresent(list, location.directory + "readme.txt");
 }
 

@@ -100,11 +100,11 @@ int32_t ReadProjection(FILE *handle, int32_t mode, ProjInfo_t *record) {
     return DecodeGeosys(record->geosys, nullptr);
 }
 
-void ReadGcpSegment(FILE *handle, int32_t mode, int32_t segment,
-                    int32_t *count, char *pixelUnits, char *groundGeosys,
-                    char *elevationUnits, char *groundUnits, int32_t *ids,
-                    double *pixels, double *lines, double *pixelHeights,
-                    double *longitudes, double *latitudes, double *heights) {
+void ReadGcpSegment(FILE *handle, int32_t mode, int32_t segment, int32_t *count,
+                    char *pixelUnits, char *groundGeosys, char *elevationUnits,
+                    char *groundUnits, int32_t *ids, double *pixels,
+                    double *lines, double *pixelHeights, double *longitudes,
+                    double *latitudes, double *heights) {
     if (mode != 0)
         return;
     RequireSegmentOne(segment);
@@ -112,8 +112,8 @@ void ReadGcpSegment(FILE *handle, int32_t mode, int32_t segment,
     if (entry == nullptr)
         return;
     entry->GcpSegment(count, pixelUnits, groundGeosys, elevationUnits,
-                      groundUnits, ids, pixels, lines, pixelHeights,
-                      longitudes, latitudes, heights);
+                      groundUnits, ids, pixels, lines, pixelHeights, longitudes,
+                      latitudes, heights);
 }
 
 char **ReadMetadata(FILE *handle, int32_t mode, int32_t objectType,

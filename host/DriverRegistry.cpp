@@ -41,9 +41,8 @@ std::vector<std::string> CandidatePaths() {
     if (const char *configured = std::getenv("VXB_DRIVER_PATH");
         configured != nullptr && *configured != '\0') {
         std::string path = configured;
-        candidates.push_back(IsDirectory(path)
-                                 ? path + "/" + kDriverModuleName
-                                 : path);
+        candidates.push_back(IsDirectory(path) ? path + "/" + kDriverModuleName
+                                               : path);
     }
     std::string here = FolderOfThisLibrary();
     if (!here.empty())
@@ -59,8 +58,8 @@ bool TryLoad(const std::string &path, LoadedDriver &driver) {
     void *module = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
     if (module == nullptr) {
         const char *reason = dlerror();
-        driver.failure += path + ": " + (reason ? reason : "cannot load") +
-                          "\n";
+        driver.failure +=
+            path + ": " + (reason ? reason : "cannot load") + "\n";
         return false;
     }
     auto registrar = reinterpret_cast<DriverRegistrarFn>(
@@ -112,8 +111,7 @@ std::vector<std::pair<std::string, size_t>> RegisteredOperations() {
         {"ReadOrbitSegment", offsetof(DriverTable, ReadOrbitSegment)},
         {"ReadBinarySegment", offsetof(DriverTable, ReadBinarySegment)},
         {"BinarySegmentLength", offsetof(DriverTable, BinarySegmentLength)},
-        {"IncidenceArraySegment",
-         offsetof(DriverTable, IncidenceArraySegment)},
+        {"IncidenceArraySegment", offsetof(DriverTable, IncidenceArraySegment)},
         {"ListCalibrationTypes", offsetof(DriverTable, ListCalibrationTypes)},
         {"NormalizeDatasetName", offsetof(DriverTable, NormalizeDatasetName)},
         {"ListImageFiles", offsetof(DriverTable, ListImageFiles)},

@@ -25,8 +25,8 @@ using IntegerChannelReadFn = void (*)(FILE *, int32_t, int32_t, int32_t,
                                       int32_t, int32_t, int32_t *, int32_t,
                                       int32_t, int32_t, const int32_t *);
 using RealChannelReadFn = void (*)(FILE *, int32_t, int32_t, int32_t, int32_t,
-                                   int32_t, float *, int32_t, int32_t,
-                                   int32_t, const int32_t *);
+                                   int32_t, float *, int32_t, int32_t, int32_t,
+                                   const int32_t *);
 using DescribeChannelFn = int32_t (*)(FILE *, int32_t, int32_t, char *);
 using CloseDatasetFn = void (*)(FILE *);
 using OpenDatasetFn = FILE *(*)(const char *, const char *);
@@ -41,10 +41,9 @@ using ReadGcpSegmentFn = void (*)(FILE *, int32_t, int32_t, int32_t *, char *,
                                   double *, double *, double *, double *,
                                   double *);
 using ReadMetadataFn = char **(*)(FILE *, int32_t, int32_t, int32_t, char **);
-using ReadOrbitSegmentFn = void (*)(FILE *, int32_t, int32_t,
-                                    EphemerisSeg_t *);
-using ReadBinarySegmentFn = void (*)(FILE *, int32_t, int32_t, int32_t,
-                                     int32_t, unsigned char *);
+using ReadOrbitSegmentFn = void (*)(FILE *, int32_t, int32_t, EphemerisSeg_t *);
+using ReadBinarySegmentFn = void (*)(FILE *, int32_t, int32_t, int32_t, int32_t,
+                                     unsigned char *);
 using BinarySegmentLengthFn = int32_t (*)(FILE *, int32_t);
 using IncidenceArraySegmentFn = void (*)(FILE *, int32_t, int32_t, int32_t *,
                                          int32_t *, double **, char *);
@@ -57,44 +56,44 @@ using ListAuxiliaryFilesFn = char **(*)(FILE *);
 /// The host's table of driver operations: 8-byte entries at fixed byte
 /// offsets. Entries a driver does not fill stay null and are never called.
 struct DriverTable {
-    RawSizeInfoFn RawSizeInfo;                         // 0
-    void *reserved8[3];                                // 8
-    RawChanTypeFn RawChanType;                         // 32
-    void *reserved40[2];                               // 40
-    IntegerChannelReadFn IntegerChannelRead;           // 56
-    void *reserved64;                                  // 64
-    RealChannelReadFn RealChannelRead;                 // 72
-    void *reserved80[6];                               // 80
-    DescribeChannelFn DescribeChannel;                 // 128
-    CloseDatasetFn CloseDataset;                       // 136
-    OpenDatasetFn OpenDataset;                         // 144
-    void *reserved152[4];                              // 152
-    DescribeObjectFn DescribeObject;                   // 184
-    void *reserved192[2];                              // 192
-    FindSegmentFn FindSegment;                         // 208
-    void *reserved216[7];                              // 216
-    OpenTextSegmentFn OpenTextSegment;                 // 272
-    ReadTextLineFn ReadTextLine;                       // 280
-    void *reserved288[5];                              // 288
-    ReadProjectionFn ReadProjection;                   // 328
-    void *reserved336[8];                              // 336
-    ReadGcpSegmentFn ReadGcpSegment;                   // 400
-    void *reserved408[50];                             // 408
-    ReadMetadataFn ReadMetadata;                       // 808
-    void *reserved816[12];                             // 816
-    ReadOrbitSegmentFn ReadOrbitSegment;               // 912
-    ReadBinarySegmentFn ReadBinarySegment;             // 920
-    BinarySegmentLengthFn BinarySegmentLength;         // 928
-    void *reserved936;                                 // 936
-    IncidenceArraySegmentFn IncidenceArraySegment;     // 944
-    void *reserved952[3];                              // 952
-    ListCalibrationTypesFn ListCalibrationTypes;       // 976
-    void *reserved984[8];                              // 984
-    NormalizeDatasetNameFn NormalizeDatasetName;       // 1048
-    void *reserved1056[7];                             // 1056
-    ListImageFilesFn ListImageFiles;                   // 1112
-    BrowseImageFileFn BrowseImageFile;                 // 1120
-    ListAuxiliaryFilesFn ListAuxiliaryFiles;           // 1128
+    RawSizeInfoFn RawSizeInfo;                     // 0
+    void *reserved8[3];                            // 8
+    RawChanTypeFn RawChanType;                     // 32
+    void *reserved40[2];                           // 40
+    IntegerChannelReadFn IntegerChannelRead;       // 56
+    void *reserved64;                              // 64
+    RealChannelReadFn RealChannelRead;             // 72
+    void *reserved80[6];                           // 80
+    DescribeChannelFn DescribeChannel;             // 128
+    CloseDatasetFn CloseDataset;                   // 136
+    OpenDatasetFn OpenDataset;                     // 144
+    void *reserved152[4];                          // 152
+    DescribeObjectFn DescribeObject;               // 184
+    void *reserved192[2];                          // 192
+    FindSegmentFn FindSegment;                     // 208
+    void *reserved216[7];                          // 216
+    OpenTextSegmentFn OpenTextSegment;             // 272
+    ReadTextLineFn ReadTextLine;                   // 280
+    void *reserved288[5];                          // 288
+    ReadProjectionFn ReadProjection;               // 328
+    void *reserved336[8];                          // 336
+    ReadGcpSegmentFn ReadGcpSegment;               // 400
+    void *reserved408[50];                         // 408
+    ReadMetadataFn ReadMetadata;                   // 808
+    void *reserved816[12];                         // 816
+    ReadOrbitSegmentFn ReadOrbitSegment;           // 912
+    ReadBinarySegmentFn ReadBinarySegment;         // 920
+    BinarySegmentLengthFn BinarySegmentLength;     // 928
+    void *reserved936;                             // 936
+    IncidenceArraySegmentFn IncidenceArraySegment; // 944
+    void *reserved952[3];                          // 952
+    ListCalibrationTypesFn ListCalibrationTypes;   // 976
+    void *reserved984[8];                          // 984
+    NormalizeDatasetNameFn NormalizeDatasetName;   // 1048
+    void *reserved1056[7];                         // 1056
+    ListImageFilesFn ListImageFiles;               // 1112
+    BrowseImageFileFn BrowseImageFile;             // 1120
+    ListAuxiliaryFilesFn ListAuxiliaryFiles;       // 1128
 };
 
 static_assert(offsetof(DriverTable, RawSizeInfo) == 0);

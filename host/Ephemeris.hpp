@@ -12,7 +12,7 @@ struct StateVector_t {
 };
 
 struct AttitudeSample_t {
-    double seconds; // seconds of day
+    double seconds;          // seconds of day
     double yaw, roll, pitch; // degrees
 };
 

@@ -18,8 +18,9 @@ struct WindowRequest {
 
 /// One ground control point of a GeoTIFF (ModelTiepointTag).
 struct TiePoint {
-    double pixel, line;  // raster position
-    double x, y, z;      // model position (longitude, latitude, height for geographic files)
+    double pixel, line; // raster position
+    double x, y,
+        z; // model position (longitude, latitude, height for geographic files)
 };
 
 /// A GeoTIFF file opened for reading by the built-in reader. It owns its

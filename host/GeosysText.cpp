@@ -64,8 +64,8 @@ Decoded DecodeWords(const std::vector<std::string> &words) {
     if (words.empty())
         return {};
     const std::string &kind = words[0];
-    bool datumOnly = words.size() == 1 ||
-                     (words.size() == 2 && IsWgs84Datum(words[1]));
+    bool datumOnly =
+        words.size() == 1 || (words.size() == 2 && IsWgs84Datum(words[1]));
     if ((kind == "LONG" || kind == "LON") && datumOnly)
         return {kGeosysLong, "LONG D000"};
     if (kind == "PIXEL" && words.size() == 1)

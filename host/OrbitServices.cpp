@@ -172,7 +172,8 @@ bool GetSARFlippingParameters(char *const *list, bool *lineFlip,
         return false;
     const char *lineOrder = FetchAuxEntry(list, "lineTimeOrdering");
     if (lineFlip)
-        *lineFlip = lineOrder != nullptr && std::strcmp(lineOrder, "Decreasing") == 0;
+        *lineFlip =
+            lineOrder != nullptr && std::strcmp(lineOrder, "Decreasing") == 0;
     if (pixelFlip)
         *pixelFlip = std::strcmp(pixelOrder, "Decreasing") == 0;
     return true;

@@ -47,10 +47,10 @@ bool IsDriverDataset(const RasterHandle &handle) {
 
 // A driver's answers can only be trusted for requests that fit the raster it
 // declared, so the host checks windows and channels before passing them on.
-void CheckDatasetWindow(const RasterHandle &handle, int32_t xoff,
-                        int32_t yoff, int32_t xsize, int32_t ysize,
-                        const void *dst, int32_t dstx, int32_t dsty,
-                        int32_t nchan, const int32_t *chanlist) {
+void CheckDatasetWindow(const RasterHandle &handle, int32_t xoff, int32_t yoff,
+                        int32_t xsize, int32_t ysize, const void *dst,
+                        int32_t dstx, int32_t dsty, int32_t nchan,
+                        const int32_t *chanlist) {
     const char *name = handle.name.c_str();
     if (dst == nullptr || chanlist == nullptr)
         IMPError(kErrBadRequest, host::kError, "%s: no buffer or channel list",
@@ -126,9 +126,8 @@ void ThinTiePointsIntoGcps(const host::GeoTiffImage &image, int32_t *count,
                            double *zs) {
     const std::vector<host::TiePoint> &points = image.TiePoints();
     const size_t n = points.size();
-    const size_t step =
-        std::max<size_t>(1, (n + kMaxGcpSegmentPoints - 1) /
-                                kMaxGcpSegmentPoints);
+    const size_t step = std::max<size_t>(1, (n + kMaxGcpSegmentPoints - 1) /
+                                                kMaxGcpSegmentPoints);
     int32_t written = 0;
     for (size_t i = 0; i < n && written < kMaxGcpSegmentPoints; i += step) {
         ids[written] = written + 1;
@@ -182,8 +181,7 @@ void RawClose(FILE *fp) {
     }
 }
 
-void RawSizeInfo(FILE *fp, int32_t *width, int32_t *height,
-                 int32_t *channels) {
+void RawSizeInfo(FILE *fp, int32_t *width, int32_t *height, int32_t *channels) {
     RasterHandle *handle = host::LookupHandle(fp);
     bool known = handle != nullptr && handle->defined;
     if (width)
@@ -271,12 +269,13 @@ void VXBInt32ChanIO(FILE *fp, int32_t mode, int32_t xoff, int32_t yoff,
     RasterHandle &handle = RequireHandle(fp);
     RequireReadMode(mode, handle);
     if (handle.image) {
-        handle.image->ReadInt32(MakeWindow(xoff, yoff, xsize, ysize, dstx, dsty),
-                                ChannelVector(nchan, chanlist), dst);
+        handle.image->ReadInt32(
+            MakeWindow(xoff, yoff, xsize, ysize, dstx, dsty),
+            ChannelVector(nchan, chanlist), dst);
         return;
     }
-    CheckDatasetWindow(handle, xoff, yoff, xsize, ysize, dst, dstx, dsty,
-                       nchan, chanlist);
+    CheckDatasetWindow(handle, xoff, yoff, xsize, ysize, dst, dstx, dsty, nchan,
+                       chanlist);
     const DriverTable &table = RequireDriver();
     if (table.IntegerChannelRead != nullptr)
         table.IntegerChannelRead(fp, mode, xoff, yoff, xsize, ysize, dst, dstx,
@@ -294,8 +293,8 @@ void VXBReal32ChanIO(FILE *fp, int32_t mode, int32_t xoff, int32_t yoff,
             ChannelVector(nchan, chanlist), dst);
         return;
     }
-    CheckDatasetWindow(handle, xoff, yoff, xsize, ysize, dst, dstx, dsty,
-                       nchan, chanlist);
+    CheckDatasetWindow(handle, xoff, yoff, xsize, ysize, dst, dstx, dsty, nchan,
+                       chanlist);
     const DriverTable &table = RequireDriver();
     if (table.RealChannelRead != nullptr)
         table.RealChannelRead(fp, mode, xoff, yoff, xsize, ysize, dst, dstx,
@@ -332,28 +331,26 @@ int32_t VXBProjectionIO(FILE *fp, int32_t mode, ProjInfo_t *record) {
     return table.ReadProjection(fp, mode, record);
 }
 
-void VXBGcpIO(FILE *fp, int32_t mode, int32_t segment, int32_t,
-              int32_t *count, char *pixelUnits, char *groundGeosys,
-              char *elevationUnits, char *groundUnits, int32_t *ids,
-              double *pixels, double *lines, double *pixelHeights, double *xs,
-              double *ys, double *zs) {
+void VXBGcpIO(FILE *fp, int32_t mode, int32_t segment, int32_t, int32_t *count,
+              char *pixelUnits, char *groundGeosys, char *elevationUnits,
+              char *groundUnits, int32_t *ids, double *pixels, double *lines,
+              double *pixelHeights, double *xs, double *ys, double *zs) {
     RasterHandle &handle = RequireHandle(fp);
     RequireReadMode(mode, handle);
     if (IsDriverDataset(handle)) {
         const DriverTable &table = RequireDriver();
         if (table.ReadGcpSegment != nullptr)
             table.ReadGcpSegment(fp, mode, segment, count, pixelUnits,
-                                 groundGeosys, elevationUnits, groundUnits,
-                                 ids, pixels, lines, pixelHeights, xs, ys, zs);
+                                 groundGeosys, elevationUnits, groundUnits, ids,
+                                 pixels, lines, pixelHeights, xs, ys, zs);
         return;
     }
     if (segment != 1)
         IMPError(kErrInvalidSegment, host::kError, "invalid segment number");
     if (count == nullptr || pixelUnits == nullptr || groundGeosys == nullptr ||
-        elevationUnits == nullptr || groundUnits == nullptr ||
-        ids == nullptr || pixels == nullptr || lines == nullptr ||
-        pixelHeights == nullptr || xs == nullptr || ys == nullptr ||
-        zs == nullptr)
+        elevationUnits == nullptr || groundUnits == nullptr || ids == nullptr ||
+        pixels == nullptr || lines == nullptr || pixelHeights == nullptr ||
+        xs == nullptr || ys == nullptr || zs == nullptr)
         IMPError(kErrBadRequest, host::kError, "%s: missing GCP output",
                  handle.name.c_str());
     ThinTiePointsIntoGcps(*handle.image, count, ids, pixels, lines,

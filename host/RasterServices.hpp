@@ -40,8 +40,7 @@ void RawDefine(FILE *fp, int32_t width, int32_t height, int32_t channels,
 /// Forgets the layout stored by RawDefine.
 void RawClose(FILE *fp);
 /// The layout stored by RawDefine (zeros when none); null outputs are skipped.
-void RawSizeInfo(FILE *fp, int32_t *width, int32_t *height,
-                 int32_t *channels);
+void RawSizeInfo(FILE *fp, int32_t *width, int32_t *height, int32_t *channels);
 /// The type code of a channel (1-based) as stored by RawDefine, 0 when none.
 int32_t RawChanType(FILE *fp, int32_t channel);
 
@@ -88,8 +87,8 @@ constexpr int32_t kMaxGcpSegmentPoints = 256;
 void VXBGcpIO(FILE *fp, int32_t mode, int32_t segment, int32_t reserved,
               int32_t *count, char *pixelUnits, char *groundGeosys,
               char *elevationUnits, char *groundUnits, int32_t *ids,
-              double *pixels, double *lines, double *pixelHeights,
-              double *xs, double *ys, double *zs);
+              double *pixels, double *lines, double *pixelHeights, double *xs,
+              double *ys, double *zs);
 /// Length in bytes of binary segment `segment` (a GeoTIFF's segment 1 is its
 /// RPC model as an RF block, length 0 when the file has none).
 int32_t VXBGetBinaryLength(FILE *fp, int32_t segment);

@@ -8,8 +8,7 @@ class ZirOdi2GeoCorrected : public ZirOdi2CalibImage {
     void CalibrateDetected(int32_t xOffset, int32_t yOffset, int32_t width,
                            int32_t height, float *samples) override;
     void CombineComplex(const float *inPhase, const float *quadrature,
-                        int32_t width, int32_t height,
-                        float *result) override;
+                        int32_t width, int32_t height, float *result) override;
 };
 
 /// Ground-range detected products (SGX, SGF, SGC, SCN, SCW).
@@ -18,8 +17,7 @@ class ZirOdi2GrndRangeP : public ZirOdi2CalibImage {
     void CalibrateDetected(int32_t xOffset, int32_t yOffset, int32_t width,
                            int32_t height, float *samples) override;
     void CombineComplex(const float *inPhase, const float *quadrature,
-                        int32_t width, int32_t height,
-                        float *result) override;
+                        int32_t width, int32_t height, float *result) override;
 };
 
 /// Single-look complex products with one image file.
@@ -28,8 +26,7 @@ class ZirOdi2SLC : public ZirOdi2CalibImage {
     void CalibrateDetected(int32_t xOffset, int32_t yOffset, int32_t width,
                            int32_t height, float *samples) override;
     void CombineComplex(const float *inPhase, const float *quadrature,
-                        int32_t width, int32_t height,
-                        float *result) override;
+                        int32_t width, int32_t height, float *result) override;
     char *MatrixType() override;
     void DefineChannels() override;
     char *PolarizationText() override;

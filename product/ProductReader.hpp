@@ -12,8 +12,8 @@ struct ProductReader {
     ProductReader(const ProductReader &) = delete;
     ProductReader &operator=(const ProductReader &) = delete;
 
-    char *productPath = nullptr;              // host string, freed with the reader
-    RFInfo_t *rationalFunctions = nullptr;    // released with RFDeallocate
+    char *productPath = nullptr;           // host string, freed with the reader
+    RFInfo_t *rationalFunctions = nullptr; // released with RFDeallocate
 };
 
 /// Parses the product description at path and returns a new model of the

@@ -95,13 +95,14 @@ TEST_F(ToolOnProduct, exit_codes_tell_errors_from_bad_usage) {
     const std::pair<std::string, int> cases[] = {
         {"--version", 0},
         {"info " + Quoted(product.productXml), 0},
-        {"info", 2},                                      // NAME missing
-        {"read " + Quoted(product.productXml), 2},        // --window missing
-        {"frobnicate", 2},                                // no such command
+        {"info", 2},                                       // NAME missing
+        {"read " + Quoted(product.productXml), 2},         // --window missing
+        {"frobnicate", 2},                                 // no such command
         {"info " + Quoted(folder.File("missing.xml")), 1}, // nothing there
         {"info " + Quoted(product.productXml + "?c=sigma0"), 1}, // bad choice
         {"read " + Quoted(product.productXml) + " --window 20 0 10 1", 1},
-        {"read " + Quoted(product.productXml) + " --window 0 0 2 2 --channels 3",
+        {"read " + Quoted(product.productXml) +
+             " --window 0 0 2 2 --channels 3",
          2},
     };
     for (const auto &[arguments, code] : cases)

@@ -19,10 +19,11 @@ json EntriesJson(const host::Entries &entries) {
 json ChannelsJson(const host::Raster &raster) {
     json channels = json::array();
     for (int32_t number = 1; number <= raster.ChannelCount(); ++number)
-        channels.push_back({{"number", number},
-                            {"type", raster.ChannelType(number)},
-                            {"description", raster.ChannelDescription(number)},
-                            {"metadata", EntriesJson(raster.Metadata(2, number))}});
+        channels.push_back(
+            {{"number", number},
+             {"type", raster.ChannelType(number)},
+             {"description", raster.ChannelDescription(number)},
+             {"metadata", EntriesJson(raster.Metadata(2, number))}});
     return channels;
 }
 
@@ -110,15 +111,14 @@ json RpcJson(const host::Raster &raster) {
             {"longitude_scale", r.longitudeScale},
             {"height_offset", r.heightOffset},
             {"height_scale", r.heightScale},
-            {"line_numerator", Coefficients(r.lineNumeratorCoefficients,
-                                            r.coefficientCount)},
-            {"line_denominator", Coefficients(r.lineDenominatorCoefficients,
-                                              r.coefficientCount)},
-            {"pixel_numerator", Coefficients(r.pixelNumeratorCoefficients,
-                                             r.coefficientCount)},
+            {"line_numerator",
+             Coefficients(r.lineNumeratorCoefficients, r.coefficientCount)},
+            {"line_denominator",
+             Coefficients(r.lineDenominatorCoefficients, r.coefficientCount)},
+            {"pixel_numerator",
+             Coefficients(r.pixelNumeratorCoefficients, r.coefficientCount)},
             {"pixel_denominator",
-             Coefficients(r.pixelDenominatorCoefficients,
-                          r.coefficientCount)}};
+             Coefficients(r.pixelDenominatorCoefficients, r.coefficientCount)}};
 }
 
 json FilesJson(const host::Raster &raster) {

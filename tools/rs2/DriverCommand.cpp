@@ -10,8 +10,7 @@ void AddDriverCommand(CLI::App &app) {
     command->callback([] {
         host::DriverInfo driver = host::LoadedDriver();
         std::printf("driver module: %s\n", driver.path.c_str());
-        std::printf("registered operations (%zu):\n",
-                    driver.operations.size());
+        std::printf("registered operations (%zu):\n", driver.operations.size());
         for (const auto &[name, offset] : driver.operations)
             std::printf("  %4zu  %s\n", offset, name.c_str());
     });

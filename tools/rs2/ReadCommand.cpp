@@ -12,8 +12,8 @@ namespace {
 
 struct ReadOptions {
     std::string name;
-    std::vector<int32_t> window;      // x y w h
-    std::vector<int32_t> bufferSize;  // bw bh
+    std::vector<int32_t> window;     // x y w h
+    std::vector<int32_t> bufferSize; // bw bh
     std::vector<int32_t> channels;
     bool real = false;
     bool integer = false;
@@ -26,22 +26,22 @@ void PrintSamples(const std::vector<Sample> &data, int32_t width,
     for (int32_t y = 0; y < height; ++y) {
         for (int32_t x = 0; x < width; ++x)
             for (size_t s = 0; s < perPixel; ++s)
-                std::cout << (x || s ? " " : "")
-                          << data[(static_cast<size_t>(y) * width + x) *
-                                      perPixel +
-                                  s];
+                std::cout
+                    << (x || s ? " " : "")
+                    << data[(static_cast<size_t>(y) * width + x) * perPixel +
+                            s];
         std::cout << "\n";
     }
 }
 
 void RunRead(const ReadOptions &options) {
     host::Raster raster = host::OpenRaster(options.name);
-    host::Window window{options.window[0], options.window[1],
-                        options.window[2], options.window[3]};
-    int32_t width = options.bufferSize.empty() ? window.width
-                                               : options.bufferSize[0];
-    int32_t height = options.bufferSize.empty() ? window.height
-                                                : options.bufferSize[1];
+    host::Window window{options.window[0], options.window[1], options.window[2],
+                        options.window[3]};
+    int32_t width =
+        options.bufferSize.empty() ? window.width : options.bufferSize[0];
+    int32_t height =
+        options.bufferSize.empty() ? window.height : options.bufferSize[1];
     std::vector<int32_t> channels = options.channels;
     if (channels.empty()) {
         channels.resize(raster.ChannelCount());
@@ -49,9 +49,9 @@ void RunRead(const ReadOptions &options) {
     }
     for (int32_t channel : channels)
         if (channel < 1 || channel > raster.ChannelCount())
-            throw CLI::ValidationError(
-                "--channels", "channel " + std::to_string(channel) +
-                                  " does not exist");
+            throw CLI::ValidationError("--channels",
+                                       "channel " + std::to_string(channel) +
+                                           " does not exist");
     int32_t type = raster.ChannelType(channels.front());
     // Real channels (4, 9) are read as floats, the others as integers,
     // unless the user chooses.
@@ -97,8 +97,8 @@ void AddReadCommand(CLI::App &app) {
         ->check(CLI::PositiveNumber);
     command->add_option("--channels", options.channels, "e.g. 1,2")
         ->delimiter(',');
-    auto *real = command->add_flag("--real", options.real,
-                                   "read as 32-bit floats");
+    auto *real =
+        command->add_flag("--real", options.real, "read as 32-bit floats");
     command->add_flag("--int", options.integer, "read as 32-bit integers")
         ->excludes(real);
     command->add_flag("--json", options.json,
