@@ -22,6 +22,9 @@ demo: build
 	$(RS2) --version
 	$(RS2) driver
 	$(RS2) info $(SAMPLE)
+	mkdir -p $(BUILD)/demo
+	$(RS2) export '$(SAMPLE)?c=sigma' $(BUILD)/demo/sigma0.tif
+	@echo "Sigma Nought GeoTIFF of the sample product: $(BUILD)/demo/sigma0.tif"
 
 sanitize: deps
 	cmake -S . -B $(BUILD)-asan -DCMAKE_BUILD_TYPE=Debug -DSANITIZE=address,undefined -DRS2_BUILD_BENCHMARKS=OFF

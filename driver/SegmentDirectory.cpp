@@ -5,7 +5,9 @@
 #include "host/RasterServices.hpp"
 #include "host/StringLists.hpp"
 
+#include <cstddef>
 #include <cstring>
+#include <string>
 #include <strings.h>
 
 namespace {
@@ -34,10 +36,46 @@ const char *SegmentText(int32_t type) {
 }
 
 // The lines of the product description being read as the annotation
-// segment. One list serves every cursor of every dataset: it is filled by the
-// first read that finds it empty and dropped when a cursor reaches its end.
-char **textLineCache = nullptr;
-int32_t textLineCount = 0; // number of lines in textLineCache
+// segment, and the dataset they belong to. One list serves every cursor: it
+// is filled by a read that finds it empty or holding another dataset's
+// lines, and dropped when a cursor reaches its end. The dataset is known by
+// its handle and name together, so that a handle the host hands out again
+// for another dataset does not find the lines of the closed one.
+struct TextLineCache {
+    char **lines = nullptr;
+    int32_t count = 0; // number of entries of lines
+    FILE *handle = nullptr;
+    std::string name;
+
+    bool Holds(FILE *handleIn, const std::string &nameIn) const {
+        return lines != nullptr && handle == handleIn && name == nameIn;
+    }
+    void Drop() {
+        DestroyStringList(lines);
+        lines = nullptr;
+        count = 0;
+        handle = nullptr;
+        name.clear();
+    }
+    // Reads the product description of the dataset; false when it cannot
+    // be turned into lines, and the cache is then empty.
+    bool Load(FILE *handleIn, const std::string &nameIn) {
+        Drop();
+        orv::core::fileio::File file = ParseFileName(nameIn.c_str());
+        lines = TextFileToStringList(file.GetNormalizedName().c_str());
+        if (lines == nullptr)
+            return false;
+        count = CountStringList(lines);
+        handle = handleIn;
+        name = nameIn;
+        return true;
+    }
+};
+
+TextLineCache &TextLines() {
+    static TextLineCache cache;
+    return cache;
+}
 
 } // namespace
 
@@ -65,25 +103,22 @@ int32_t OpenTextSegment(FILE *handle, TextCursor *cursor, const char *access,
 }
 
 int32_t ReadTextLine(TextCursor *cursor, char *buffer, int32_t length) {
-    const char *name = fp2filename(cursor->handle);
-    if (textLineCache == nullptr) {
-        orv::core::fileio::File file = ParseFileName(name ? name : "");
-        textLineCache =
-            TextFileToStringList(file.GetNormalizedName().c_str());
-        if (textLineCache == nullptr)
-            return 0;
-        textLineCount = CountStringList(textLineCache);
-    }
-    // A cursor whose index lies past the end of the list (another dataset's
-    // shorter description, or a negative index) has reached its end.
-    if (cursor->lineIndex < 0 || cursor->lineIndex >= textLineCount) {
-        DestroyStringList(textLineCache);
-        textLineCache = nullptr;
-        return 0;
-    }
+    // A buffer without room receives nothing, not even a terminating zero.
     if (length <= 0)
         return 0;
-    std::strncpy(buffer, textLineCache[cursor->lineIndex], length);
+    const char *known = fp2filename(cursor->handle);
+    const std::string name = known != nullptr ? known : "";
+    TextLineCache &cache = TextLines();
+    if (!cache.Holds(cursor->handle, name) && !cache.Load(cursor->handle, name))
+        return 0;
+    // A cursor whose index lies past the end of the list (or is negative)
+    // has reached its end.
+    if (cursor->lineIndex < 0 || cursor->lineIndex >= cache.count) {
+        cache.Drop();
+        return 0;
+    }
+    std::strncpy(buffer, cache.lines[cursor->lineIndex],
+                 static_cast<std::size_t>(length));
     buffer[length - 1] = '\0';
     ++cursor->lineIndex;
     return 1;

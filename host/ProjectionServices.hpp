@@ -25,6 +25,13 @@ enum GeosysCode : int32_t {
 };
 
 /// A coordinate system with its affine pixel-to-map transform.
+///
+/// Pixel convention (pixel is area): the transform takes raster positions
+/// (column, line) whose origin (0, 0) is the upper-left CORNER of the first
+/// pixel; map x = transform[0] + column * transform[1] + line * transform[2],
+/// map y = transform[3] + column * transform[4] + line * transform[5]. The
+/// centre of pixel (c, l) is at (c + 0.5, l + 0.5). Ground control points
+/// the host hands out (VXBGcpIO) use the same raster positions.
 struct ProjInfo_t {
     char geosys[kGeosysTextSize]; // coordinate-system text
     /// GDAL order: upper-left X, X step per column, X step per line,

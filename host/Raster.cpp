@@ -15,16 +15,21 @@
 #include <cstdlib>
 #include <cstring>
 #include <memory>
+#include <sys/stat.h>
 
 namespace host {
 namespace {
 
 constexpr int32_t kErrNoDataset = 1;
 constexpr int32_t kErrNoOrbit = 23;
+// A request the host's raster services refuse (their code for it).
+constexpr int32_t kErrBadRequest = 5;
 // Long enough for any line of a product description.
 constexpr int32_t kTextLineSize = 1 << 16;
 // Description buffers of the driver operations hold 80 characters and a zero.
 constexpr size_t kDescriptionSize = 81;
+// The file a product folder is opened by.
+constexpr const char *kProductDescription = "product.xml";
 
 // Runs a host call and turns the host's reports and the driver's exceptions
 // into host::Error for the application.
@@ -56,8 +61,7 @@ std::vector<std::string> ListTexts(char *const *list) {
 
 const DriverTable *DriverFor(FILE *handle) {
     RasterHandle *object = LookupHandle(handle);
-    if (object == nullptr ||
-        object->kind != RasterHandle::Kind::DriverDataset)
+    if (object == nullptr || object->kind != RasterHandle::Kind::DriverDataset)
         return nullptr;
     return ActiveDriver();
 }
@@ -77,12 +81,73 @@ size_t BufferSize(int32_t width, int32_t height, size_t channels,
                   size_t samplesPerValue) {
     if (width <= 0 || height <= 0 || channels == 0)
         return 0;
-    return static_cast<size_t>(width) * static_cast<size_t>(height) *
-           channels * samplesPerValue;
+    return static_cast<size_t>(width) * static_cast<size_t>(height) * channels *
+           samplesPerValue;
 }
 
-bool IsComplexReal(int32_t typeCode) {
-    return typeCode == kChanComplexFloat32;
+bool IsDirectory(const std::string &path) {
+    struct stat info {};
+    return stat(path.c_str(), &info) == 0 && S_ISDIR(info.st_mode);
+}
+
+bool IsRegularFile(const std::string &path) {
+    struct stat info {};
+    return stat(path.c_str(), &info) == 0 && S_ISREG(info.st_mode);
+}
+
+// The name with a product folder replaced by the product description inside
+// it. The folder may carry a calibration choice in either form
+// ("dir?c=sigma", "dir:Calibration Type:Sigma Nought"); names with a scheme
+// and names that are no folder are left as they are.
+std::string ProductFolderResolved(const std::string &name) {
+    if (name.find("://") != std::string::npos)
+        return name;
+    size_t end = std::string::npos;
+    if (IsDirectory(name)) {
+        end = name.size();
+    } else if (const size_t query = name.find('?');
+               query != std::string::npos &&
+               IsDirectory(name.substr(0, query))) {
+        end = query;
+    } else {
+        const size_t slash = name.rfind('/');
+        const size_t colon =
+            name.find(':', slash == std::string::npos ? 0 : slash + 1);
+        if (colon != std::string::npos && IsDirectory(name.substr(0, colon)))
+            end = colon;
+    }
+    if (end == std::string::npos)
+        return name;
+    std::string folder = name.substr(0, end);
+    std::string product = folder;
+    if (product.empty() || product.back() != '/')
+        product += '/';
+    product += kProductDescription;
+    if (!IsRegularFile(product))
+        throw Error(kErrNoDataset,
+                    "no " + std::string(kProductDescription) + " in " + folder);
+    return product + name.substr(end);
+}
+
+bool IsComplexReal(int32_t typeCode) { return typeCode == kChanComplexFloat32; }
+
+// Floats a real read writes: two per sample of complex channels. Zero for a
+// request the host refuses, which then reports why.
+size_t RealValueCount(const Raster &raster, int32_t bufferWidth,
+                      int32_t bufferHeight,
+                      const std::vector<int32_t> &channels) {
+    const bool complex =
+        !channels.empty() && IsComplexReal(raster.ChannelType(channels[0]));
+    return BufferSize<float>(bufferWidth, bufferHeight, channels.size(),
+                             complex ? 2 : 1);
+}
+
+// A caller's buffer must hold the whole read: the host writes all of it.
+void RequireRoom(size_t needed, size_t count) {
+    if (count < needed)
+        throw Error(kErrBadRequest, "a read of " + std::to_string(needed) +
+                                        " values into a buffer of " +
+                                        std::to_string(count));
 }
 
 } // namespace
@@ -149,14 +214,10 @@ std::vector<int32_t>
 Raster::ReadInt32(const Window &window, int32_t bufferWidth,
                   int32_t bufferHeight,
                   const std::vector<int32_t> &channels) const {
-    std::vector<int32_t> buffer(BufferSize<int32_t>(
-        bufferWidth, bufferHeight, channels.size(), 1));
-    Guarded([&] {
-        VXBInt32ChanIO(handle, 0, window.x, window.y, window.width,
-                       window.height, buffer.empty() ? nullptr : buffer.data(),
-                       bufferWidth, bufferHeight,
-                       static_cast<int32_t>(channels.size()), channels.data());
-    });
+    std::vector<int32_t> buffer(
+        BufferSize<int32_t>(bufferWidth, bufferHeight, channels.size(), 1));
+    ReadInt32Into(window, bufferWidth, bufferHeight, channels, buffer.data(),
+                  buffer.size());
     return buffer;
 }
 
@@ -164,17 +225,41 @@ std::vector<float>
 Raster::ReadReal32(const Window &window, int32_t bufferWidth,
                    int32_t bufferHeight,
                    const std::vector<int32_t> &channels) const {
-    bool complex = !channels.empty() && IsComplexReal(ChannelType(channels[0]));
-    std::vector<float> buffer(BufferSize<float>(
-        bufferWidth, bufferHeight, channels.size(), complex ? 2 : 1));
+    std::vector<float> buffer(
+        RealValueCount(*this, bufferWidth, bufferHeight, channels));
+    ReadReal32Into(window, bufferWidth, bufferHeight, channels, buffer.data(),
+                   buffer.size());
+    return buffer;
+}
+
+void Raster::ReadInt32Into(const Window &window, int32_t bufferWidth,
+                           int32_t bufferHeight,
+                           const std::vector<int32_t> &channels, int32_t *dst,
+                           size_t count) const {
+    const size_t needed =
+        BufferSize<int32_t>(bufferWidth, bufferHeight, channels.size(), 1);
+    RequireRoom(needed, count);
+    Guarded([&] {
+        VXBInt32ChanIO(handle, 0, window.x, window.y, window.width,
+                       window.height, needed == 0 ? nullptr : dst, bufferWidth,
+                       bufferHeight, static_cast<int32_t>(channels.size()),
+                       channels.data());
+    });
+}
+
+void Raster::ReadReal32Into(const Window &window, int32_t bufferWidth,
+                            int32_t bufferHeight,
+                            const std::vector<int32_t> &channels, float *dst,
+                            size_t count) const {
+    const size_t needed =
+        RealValueCount(*this, bufferWidth, bufferHeight, channels);
+    RequireRoom(needed, count);
     Guarded([&] {
         VXBReal32ChanIO(handle, 0, window.x, window.y, window.width,
-                        window.height, buffer.empty() ? nullptr : buffer.data(),
-                        bufferWidth, bufferHeight,
-                        static_cast<int32_t>(channels.size()),
+                        window.height, needed == 0 ? nullptr : dst, bufferWidth,
+                        bufferHeight, static_cast<int32_t>(channels.size()),
                         channels.data());
     });
-    return buffer;
 }
 
 Entries Raster::Metadata(int32_t objectType, int32_t objectNumber) const {
@@ -199,8 +284,8 @@ int32_t Raster::ProjectionCode() const {
 
 GcpSet Raster::GroundControlPoints() const {
     std::array<int32_t, kMaxGcpSegmentPoints> ids{};
-    std::array<double, kMaxGcpSegmentPoints> pixels{}, lines{}, heights{},
-        xs{}, ys{}, zs{};
+    std::array<double, kMaxGcpSegmentPoints> pixels{}, lines{}, heights{}, xs{},
+        ys{}, zs{};
     char pixelUnits[kDescriptionSize] = {}, geosys[kDescriptionSize] = {},
          elevationUnits[kDescriptionSize] = {},
          groundUnits[kDescriptionSize] = {};
@@ -211,8 +296,8 @@ GcpSet Raster::GroundControlPoints() const {
                  heights.data(), xs.data(), ys.data(), zs.data());
     });
     GcpSet set{pixelUnits, geosys, elevationUnits, groundUnits, {}};
-    count = std::min<int32_t>(std::max<int32_t>(count, 0),
-                              kMaxGcpSegmentPoints);
+    count =
+        std::min<int32_t>(std::max<int32_t>(count, 0), kMaxGcpSegmentPoints);
     for (int32_t i = 0; i < count; ++i)
         set.points.push_back(
             {ids[i], pixels[i], lines[i], xs[i], ys[i], zs[i]});
@@ -336,8 +421,8 @@ IncidenceArray Raster::Incidence() const {
     double *values = nullptr;
     char name[kDescriptionSize] = {};
     Guarded([&] {
-        table->IncidenceArraySegment(handle, 0, 1, &dimensions, &count,
-                                     &values, name);
+        table->IncidenceArraySegment(handle, 0, 1, &dimensions, &count, &values,
+                                     name);
     });
     std::unique_ptr<double, FreeDeleter> keeper(values);
     incidence.name = name;
@@ -379,10 +464,11 @@ FileLists Raster::Files() const {
 
 Raster OpenRaster(const std::string &name) {
     ClearWarnings();
-    FILE *handle = Guarded([&] { return VXBOpen(name.c_str(), "r"); });
+    const std::string resolved = ProductFolderResolved(name);
+    FILE *handle = Guarded([&] { return VXBOpen(resolved.c_str(), "r"); });
     if (handle == nullptr) {
         std::vector<std::string> warnings = Warnings();
-        throw Error(kErrNoDataset, warnings.empty() ? "cannot open " + name
+        throw Error(kErrNoDataset, warnings.empty() ? "cannot open " + resolved
                                                     : warnings.back());
     }
     return Raster(handle);
@@ -390,8 +476,8 @@ Raster OpenRaster(const std::string &name) {
 
 DriverInfo LoadedDriver() {
     if (ActiveDriver() == nullptr)
-        throw Error(kErrNoDataset, "no driver module loaded:\n" +
-                                       LoadFailure());
+        throw Error(kErrNoDataset,
+                    "no driver module loaded:\n" + LoadFailure());
     return DriverInfo{LoadedDriverPath(), RegisteredOperations()};
 }
 

@@ -16,6 +16,14 @@
 // The application API of the host: what programs use to open a raster by
 // name and ask it for pixels, metadata and segments. Every host error report
 // and every exception a driver raises for the user becomes a host::Error.
+//
+// Pixel convention (pixel is area): raster position (column, line) = (0, 0)
+// is the upper-left CORNER of the first pixel, and the centre of pixel
+// (c, l) lies at (c + 0.5, l + 0.5). Projection() transforms such positions
+// (its transform applied to (0, 0) gives the image's outer corner), and the
+// pixel and line of GroundControlPoints() are such positions too: a point at
+// the centre of the first pixel has pixel 0.5, line 0.5. GeoTIFF files
+// written as pixel-is-point are shifted by half a pixel on reading.
 
 namespace host {
 
@@ -38,7 +46,7 @@ using Entries = std::vector<std::pair<std::string, std::string>>;
 
 struct GroundControlPoint {
     int32_t id;
-    double pixel, line;
+    double pixel, line; // pixel-is-area raster position (see above)
     double x, y, z;
 };
 
@@ -102,6 +110,17 @@ class VXB_API Raster {
     std::vector<float> ReadReal32(const Window &window, int32_t bufferWidth,
                                   int32_t bufferHeight,
                                   const std::vector<int32_t> &channels) const;
+    /// The same reads into the caller's dst of count values, for programs
+    /// that read band after band into one buffer. Throws Error when count
+    /// is below what the read writes.
+    void ReadInt32Into(const Window &window, int32_t bufferWidth,
+                       int32_t bufferHeight,
+                       const std::vector<int32_t> &channels, int32_t *dst,
+                       size_t count) const;
+    void ReadReal32Into(const Window &window, int32_t bufferWidth,
+                        int32_t bufferHeight,
+                        const std::vector<int32_t> &channels, float *dst,
+                        size_t count) const;
 
     /// The metadata of object type 1 (the dataset) or 2 (channel number),
     /// or another object type the dataset answers for (181).
@@ -128,6 +147,9 @@ class VXB_API Raster {
 };
 
 /// Opens a raster by name: a GeoTIFF file, or any name the driver accepts.
+/// A product folder stands for the product.xml inside it, also with a
+/// calibration choice ("dir?c=sigma", "dir:Calibration Type:Sigma Nought");
+/// a folder without one throws Error "no product.xml in <folder>".
 Raster OpenRaster(const std::string &name);
 
 /// The driver the host loaded: module path and registered operations.

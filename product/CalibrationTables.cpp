@@ -11,19 +11,20 @@
 #include "model/LookupTable.hpp"
 #include "model/ZirOdi2CalibImage.hpp"
 #include "product/DocumentAccess.hpp"
+#include "product/FloatText.hpp"
 
+#include <algorithm>
 #include <cmath>
 #include <cstdlib>
-#include <locale>
 #include <new>
-#include <sstream>
 #include <string>
+#include <string_view>
 #include <strings.h>
+#include <vector>
 
 #include <xercesc/dom/DOMException.hpp>
 #include <xercesc/dom/DOMNamedNodeMap.hpp>
 #include <xercesc/dom/DOMNode.hpp>
-#include <xercesc/dom/DOMNodeList.hpp>
 #include <xercesc/sax/SAXException.hpp>
 #include <xercesc/util/OutOfMemoryException.hpp>
 #include <xercesc/util/XMLException.hpp>
@@ -52,6 +53,9 @@ constexpr char kNoLookupTableName[] =
 constexpr char kLookupTableMissing[] =
     "The specified LUT file %s can not be found in the directory.\n"
     "The image will be loaded without calibration";
+constexpr char kLookupTableUnreadable[] =
+    "The LUT file %s can not be read.\n"
+    "The image will be loaded without calibration";
 
 // The path of the table file whose lookupTable attribute contains pattern,
 // joined to the product directory (which ends in its separator), as a host
@@ -73,28 +77,26 @@ char *LookupTablePath(const xercesc::DOMDocument *document,
     return HString(path.c_str());
 }
 
-// Takes over a host text; a missing one reads as empty.
-std::string TextOf(char *text) {
-    const HostText owner(text);
-    return owner ? std::string(owner.get()) : std::string();
-}
-
 // The gains text holds one number per column separated by single spaces.
-// Every token gives one entry; tokens that hold no number are skipped, so
-// the parsed numbers are packed from entry 0 and the entries left over after
-// the last one stay 0.0.
-void ParseGains(const std::string &text, LookupTable &table) {
-    const std::vector<std::string> tokens = SplitTokens(text, " ");
-    table.Resize(tokens.size());
-    std::istringstream stream;
-    stream.imbue(std::locale::classic());
+// Every token gives one entry, the empty ones between two spaces included
+// (the tokens of SplitTokens(text, " "), walked in place rather than copied,
+// as a table holds many thousand); tokens that hold no number are skipped,
+// so the parsed numbers are packed from entry 0 and the entries left over
+// after the last one stay 0.0.
+void ParseGains(std::string_view text, LookupTable &table) {
+    table.Resize(
+        static_cast<std::size_t>(std::count(text.begin(), text.end(), ' ')) +
+        1);
     std::size_t k = 0;
-    for (const std::string &token : tokens) {
-        stream.clear();
-        stream.str(token);
+    std::size_t start = 0;
+    for (;;) {
+        const std::size_t space = text.find(' ', start);
         float value = 0.0f;
-        if (stream >> value)
+        if (ReadFloatLikeStream(text.substr(start, space - start), &value))
             table.Set(k++, value);
+        if (space == std::string_view::npos)
+            return;
+        start = space + 1;
     }
 }
 
@@ -112,15 +114,31 @@ template <typename Result, typename Work> Result UnlessParseFails(Work work) {
     return Result();
 }
 
+// Whether a parsed table file can be taken as a table. The parser runs
+// without an error handler, so a file that is not well-formed still yields a
+// document: an empty one when nothing could be read, or the elements read
+// before the fault. Its error count tells nothing either, as validation
+// without a grammar counts an error for every element of a sound file. So a
+// file counts as read when its document has a root element and a gains
+// element; without them it would give one gain of 0.0 and be applied as
+// calibration.
+bool IsLookupTableDocument(const xercesc::DOMDocument *document) {
+    return document != nullptr && document->getDocumentElement() != nullptr &&
+           CountElementsByTag(document, "gains") != 0;
+}
+
 // Reads a table file while the product description's parse holds the XML
-// platform; null when the file gives no document.
+// platform; null when the file gives no table document.
 std::unique_ptr<LookupTable> ParseLookupTableFile(const char *path) {
     DocumentParse parse(path, DocumentParse::Platform::AlreadyInitialized);
     const xercesc::DOMDocument *document = parse.Document();
-    if (document == nullptr)
+    if (!IsLookupTableDocument(document))
         return nullptr;
-    const std::string offsetText = TextOf(ElementText(document, "offset"));
-    const std::string gainsText = TextOf(ElementText(document, "gains"));
+    // The texts of the first offset and gains elements, "" without them.
+    const std::string offsetText =
+        NodeText(FirstElementByTag(document, "offset"));
+    const std::string gainsText =
+        NodeText(FirstElementByTag(document, "gains"));
     auto table = std::make_unique<LookupTable>();
     table->SetOffset(static_cast<float>(std::atof(offsetText.c_str())));
     ParseGains(gainsText, *table);
@@ -157,13 +175,9 @@ void AddCalibrationType(HostList &list, const std::string &kind) {
 std::vector<std::string>
 LookupTableAttributes(const xercesc::DOMDocument *document) {
     std::vector<std::string> values;
-    const XmlTranscode tag(kLookupTableTag);
-    const xercesc::DOMNodeList *elements = document->getElementsByTagName(tag);
-    const XMLSize_t elementCount =
-        elements != nullptr ? elements->getLength() : 0;
-    for (XMLSize_t i = 0; i < elementCount; ++i) {
-        const xercesc::DOMNamedNodeMap *attributes =
-            elements->item(i)->getAttributes();
+    for (const xercesc::DOMElement *element :
+         ElementsByTag(document, kLookupTableTag)) {
+        const xercesc::DOMNamedNodeMap *attributes = element->getAttributes();
         const XMLSize_t attributeCount =
             attributes != nullptr ? attributes->getLength() : 0;
         for (XMLSize_t a = 0; a < attributeCount; ++a)
@@ -212,8 +226,25 @@ std::unique_ptr<LookupTable> ReadLookupTableFile(const char *path) {
         [path] { return ParseLookupTableFile(path); });
 }
 
+const LookupTable *LookupTableFiles::Read(const char *path) {
+    if (path == nullptr)
+        return nullptr;
+    for (const auto &entry : tables)
+        if (entry.first == path)
+            return entry.second.get();
+    tables.emplace_back(path, ReadLookupTableFile(path));
+    return tables.back().second.get();
+}
+
 void LoadCalibration(const xercesc::DOMDocument *document,
                      ZirOdi2CalibImage *model, const char *option) {
+    LookupTableFiles files;
+    LoadCalibration(document, model, option, files);
+}
+
+void LoadCalibration(const xercesc::DOMDocument *document,
+                     ZirOdi2CalibImage *model, const char *option,
+                     LookupTableFiles &files) {
     if (document == nullptr || model == nullptr)
         return;
     HostText path(SelectCalibrationFile(document, model, option));
@@ -226,26 +257,35 @@ void LoadCalibration(const xercesc::DOMDocument *document,
                                MkName(_(kLookupTableMissing), path.get()));
         return;
     }
-    // A file that gives no document leaves the earlier table in place; the
-    // kind stays the one selected.
-    std::unique_ptr<LookupTable> table = ReadLookupTableFile(path.get());
-    if (table)
-        model->CalibrationTable() = std::move(*table);
+    // A file that cannot be read as a table is reported like a missing one:
+    // keeping the selected kind would label raw values as calibrated.
+    const LookupTable *table = files.Read(path.get());
+    if (table == nullptr) {
+        WarnWithoutCalibration(model,
+                               MkName(_(kLookupTableUnreadable), path.get()));
+        return;
+    }
+    model->CalibrationTable() = *table;
 }
 
 void ReadIncidenceAngles(const xercesc::DOMDocument *document,
                          ZirOdi2CalibImage *model, IncidenceFormula formula) {
+    LookupTableFiles files;
+    ReadIncidenceAngles(document, model, formula, files);
+}
+
+void ReadIncidenceAngles(const xercesc::DOMDocument *document,
+                         ZirOdi2CalibImage *model, IncidenceFormula formula,
+                         LookupTableFiles &files) {
     if (document == nullptr || model == nullptr)
         return;
     HostText sigmaPath(FindLookupTableFile(document, model, "Sigma"));
     HostText betaPath(FindLookupTableFile(document, model, "Beta"));
     if (!sigmaPath || !betaPath)
         return;
-    const std::unique_ptr<LookupTable> sigma =
-        ReadLookupTableFile(sigmaPath.get());
-    const std::unique_ptr<LookupTable> beta =
-        ReadLookupTableFile(betaPath.get());
-    if (!sigma || !beta)
+    const LookupTable *sigma = files.Read(sigmaPath.get());
+    const LookupTable *beta = files.Read(betaPath.get());
+    if (sigma == nullptr || beta == nullptr)
         return;
     // One angle per Sigma column; a shorter Beta table reads 1.0 past its
     // end. A ratio above 1 gives a not-a-number angle, kept as it is.

@@ -3,6 +3,8 @@
 #include "host/TextServices.hpp"
 
 #include <cstring>
+#include <string>
+#include <string_view>
 #include <strings.h>
 #include <unordered_map>
 #include <utility>
@@ -69,7 +71,9 @@ class ElementIndex {
 
     const DOMDocument *document;
     bool built = false;
-    std::unordered_map<std::basic_string<XMLCh>,
+    // Keyed by the names the document holds, which live as long as it: no
+    // copy of a name per element.
+    std::unordered_map<std::basic_string_view<XMLCh>,
                        std::vector<const DOMElement *>>
         elements;
 };
@@ -133,10 +137,6 @@ const DOMElement *FindElement(const DOMDocument *document, const char *tag,
     return nullptr;
 }
 
-const DOMElement *FirstElement(const DOMDocument *document, const char *tag) {
-    return FindElement(document, tag, [](const DOMElement *) { return true; });
-}
-
 // Releases a buffer that XMLString::transcode allocated.
 struct TranscodedText {
     char *text;
@@ -147,10 +147,43 @@ struct TranscodedText {
     TranscodedText &operator=(const TranscodedText &) = delete;
 };
 
+// The text content of node. getTextContent copies it into the document's
+// memory, which keeps every copy until the document is released; an element
+// whose one child is a text node, as nearly every element of a product
+// description is, holds the same text in that node.
+const XMLCh *TextContent(const DOMNode *node) {
+    const DOMNode *child = node->getFirstChild();
+    if (node->getNodeType() == DOMNode::ELEMENT_NODE && child != nullptr &&
+        child->getNextSibling() == nullptr &&
+        child->getNodeType() == DOMNode::TEXT_NODE)
+        return child->getNodeValue();
+    return node->getTextContent();
+}
+
+// The narrow text XMLString::transcode gives for text ("" for null). Text
+// all in ASCII, as product descriptions and look-up tables are, reads the
+// same in every local code page and is copied directly: transcoding costs
+// several times more, which counts for the many thousand numbers of a
+// look-up table.
+std::string NarrowText(const XMLCh *text) {
+    if (text == nullptr)
+        return std::string();
+    std::string narrow(std::char_traits<XMLCh>::length(text), '\0');
+    XMLCh seen = 0;
+    for (std::size_t i = 0; i < narrow.size(); ++i) {
+        seen |= text[i];
+        narrow[i] = static_cast<char>(text[i]);
+    }
+    if (seen < 0x80)
+        return narrow;
+    TranscodedText transcoded(text);
+    return transcoded.text != nullptr ? std::string(transcoded.text)
+                                      : std::string();
+}
+
 // The text content of node as a host string the caller frees.
 char *HostTextContent(const DOMNode *node) {
-    TranscodedText narrow(node->getTextContent());
-    return HString(narrow.text);
+    return HString(NarrowText(TextContent(node)).c_str());
 }
 
 std::string LowerCase(std::string text) {
@@ -239,22 +272,21 @@ DocumentParse::~DocumentParse() {
 std::string NodeText(const DOMNode *node) {
     if (node == nullptr)
         return std::string();
-    TranscodedText narrow(node->getTextContent());
-    return narrow.text != nullptr ? std::string(narrow.text) : std::string();
+    return NarrowText(TextContent(node));
 }
 
 char *ElementText(const DOMDocument *document, const char *tag) {
     if (document == nullptr || tag == nullptr)
         return nullptr;
-    const DOMNode *element = FirstElement(document, tag);
+    const DOMNode *element = FirstElementByTag(document, tag);
     return element != nullptr ? HostTextContent(element) : HString("");
 }
 
 XmlTranscode ElementTextTranscoded(const DOMDocument *document,
                                    const char *tag) {
     XmlTranscode text;
-    if (const DOMNode *element = FirstElement(document, tag))
-        text = XmlTranscode(element->getTextContent());
+    if (const DOMNode *element = FirstElementByTag(document, tag))
+        text = XmlTranscode(TextContent(element));
     return text;
 }
 
@@ -278,6 +310,11 @@ std::vector<const DOMElement *> ElementsByTag(const DOMDocument *document,
         return false;
     });
     return elements;
+}
+
+const DOMElement *FirstElementByTag(const DOMDocument *document,
+                                    const char *tag) {
+    return FindElement(document, tag, [](const DOMElement *) { return true; });
 }
 
 std::size_t CountElementsByTag(const DOMDocument *document, const char *tag) {

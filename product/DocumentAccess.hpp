@@ -55,6 +55,10 @@ ElementsByTag(const xercesc::DOMDocument *document, const char *tag);
 /// The number of elements of tag anywhere in the document.
 std::size_t CountElementsByTag(const xercesc::DOMDocument *document,
                                const char *tag);
+/// The first element of tag anywhere in the document, in document order;
+/// null when there is none or document or tag is missing.
+const xercesc::DOMElement *
+FirstElementByTag(const xercesc::DOMDocument *document, const char *tag);
 /// Text content of a node (all text below it, untrimmed), narrow.
 std::string NodeText(const xercesc::DOMNode *node);
 

@@ -10,6 +10,8 @@
 #include "product/SideFile.hpp"
 #include "product/StringListKeeper.hpp"
 
+#include <algorithm>
+#include <charconv>
 #include <climits>
 #include <cmath>
 #include <cstdio>
@@ -22,14 +24,14 @@
 
 #include <strings.h>
 
+#include <xercesc/dom/DOMElement.hpp>
 #include <xercesc/dom/DOMNode.hpp>
-#include <xercesc/dom/DOMNodeList.hpp>
 
 namespace {
 
 using xercesc::DOMDocument;
+using xercesc::DOMElement;
 using xercesc::DOMNode;
-using xercesc::DOMNodeList;
 
 constexpr double kSpeedOfLight = 299792458.0; // metres per second
 
@@ -60,14 +62,17 @@ void SetIfPresent(StringListKeeper &list, const std::string &value,
 }
 
 // Visits the child nodes of parent that carry a name and a text. The text
-// nodes between elements ("#text") are skipped; other node kinds (comments)
-// pass under the name the parser gives them.
+// nodes between elements (named "#text", a name no other node can have) are
+// skipped before their name is converted; other node kinds (comments) pass
+// under the name the parser gives them.
 template <typename Visit>
 void ForEachNamedChild(const DOMNode *parent, Visit visit) {
     for (const DOMNode *child = parent->getFirstChild(); child != nullptr;
          child = child->getNextSibling()) {
+        if (child->getNodeType() == DOMNode::TEXT_NODE)
+            continue;
         std::string name = XmlTranscode(child->getNodeName()).Narrow();
-        if (name.empty() || name == "#text")
+        if (name.empty())
             continue;
         std::string text = NodeText(child);
         if (!text.empty())
@@ -78,19 +83,8 @@ void ForEachNamedChild(const DOMNode *parent, Visit visit) {
 // Visits every element of tag, in document order.
 template <typename Visit>
 void ForEachElement(const DOMDocument *document, const char *tag, Visit visit) {
-    const DOMNodeList *elements =
-        document->getElementsByTagName(XmlTranscode(tag));
-    if (elements == nullptr)
-        return;
-    for (XMLSize_t i = 0; i < elements->getLength(); ++i)
-        visit(elements->item(i));
-}
-
-const DOMNode *FirstElement(const DOMDocument *document, const char *tag) {
-    const DOMNodeList *elements =
-        document->getElementsByTagName(XmlTranscode(tag));
-    return elements != nullptr && elements->getLength() > 0 ? elements->item(0)
-                                                            : nullptr;
+    for (const DOMElement *element : ElementsByTag(document, tag))
+        visit(element);
 }
 
 enum class ValueForm {
@@ -132,7 +126,7 @@ std::string FormattedValue(ValueForm form, const std::string &text) {
 void CollectChildEntries(const DOMDocument *document, const char *group,
                          std::initializer_list<ChildRule> rules,
                          StringListKeeper &list) {
-    const DOMNode *first = FirstElement(document, group);
+    const DOMNode *first = FirstElementByTag(document, group);
     if (first == nullptr)
         return;
     ForEachNamedChild(
@@ -216,8 +210,10 @@ void CollectEllipsoid(const DOMDocument *document, StringListKeeper &list) {
 
 // The slant range of the last pixel of a line. An SLC line is sampled in
 // slant range already; a ground-range line goes through the product's
-// ground-to-slant polynomial. A polynomial with fewer than its six
-// coefficients cannot be evaluated, so the far edge is then left out.
+// ground-to-slant polynomial. A list shorter than six coefficients is a
+// polynomial of lower degree: the missing ones are 0, never values that were
+// not parsed. A list without a leading number gives no polynomial and no far
+// edge.
 void SetSlantRangeFarEdge(const DOMDocument *document, StringListKeeper &list) {
     const char *columns = list.Fetch("ColumnCount");
     const char *spacing = list.Fetch("SpatialResolutionX");
@@ -235,7 +231,7 @@ void SetSlantRangeFarEdge(const DOMDocument *document, StringListKeeper &list) {
         double c[6] = {};
         if (polynomial == nullptr ||
             std::sscanf(polynomial, "%lf %lf %lf %lf %lf %lf", &c[0], &c[1],
-                        &c[2], &c[3], &c[4], &c[5]) != 6)
+                        &c[2], &c[3], &c[4], &c[5]) < 1)
             return;
         double g = lineLength - std::atof(origin);
         farEdge =
@@ -358,6 +354,19 @@ void SetRangeDistances(StringListKeeper &list) {
         list.Set("RangeDistLastpixel", last->c_str());
 }
 
+// Appends printf's "%f" of value and a ';'. to_chars writes the same text
+// (both round the exact binary value to six decimals, ties to even, and
+// write "inf", "-nan" and the like alike) several times faster than printf,
+// which matters for the thousands of numbers of a geolocation grid.
+void AppendFixedField(std::string &text, double value) {
+    // The longest is -DBL_MAX: 309 digits, a sign, a point and 6 decimals.
+    char buffer[320];
+    const std::to_chars_result result = std::to_chars(
+        buffer, buffer + sizeof buffer, value, std::chars_format::fixed, 6);
+    text.append(buffer, result.ptr);
+    text += ';';
+}
+
 // The geolocation grid, one entry per imageCoordinate element.
 struct TiePoints {
     explicit TiePoints(std::size_t count)
@@ -380,14 +389,12 @@ struct CoordinateField {
 void ReadTieCoordinates(const DOMDocument *document, const char *tag,
                         std::size_t count,
                         std::initializer_list<CoordinateField> fields) {
-    const DOMNodeList *elements =
-        document->getElementsByTagName(XmlTranscode(tag));
-    for (std::size_t i = 0; elements != nullptr && i < count; ++i) {
-        const DOMNode *element = elements->item(i);
-        if (element == nullptr)
-            break;
+    const std::vector<const DOMElement *> elements =
+        ElementsByTag(document, tag);
+    const std::size_t present = std::min(count, elements.size());
+    for (std::size_t i = 0; i < present; ++i) {
         ForEachNamedChild(
-            element, [&](const std::string &name, const std::string &text) {
+            elements[i], [&](const std::string &name, const std::string &text) {
                 for (const CoordinateField &field : fields) {
                     if (SameName(name, field.name))
                         (*field.values)[i] = std::atof(text.c_str());
@@ -396,15 +403,9 @@ void ReadTieCoordinates(const DOMDocument *document, const char *tag,
     }
 }
 
-std::size_t ElementCount(const DOMDocument *document, const char *tag) {
-    const DOMNodeList *elements =
-        document->getElementsByTagName(XmlTranscode(tag));
-    return elements != nullptr ? elements->getLength() : 0;
-}
-
 void ExtractGeolocationGrid(const DOMDocument *document,
                             ZirOdi2CalibImage *model, StringListKeeper &list) {
-    std::size_t count = ElementCount(document, "imageCoordinate");
+    std::size_t count = CountElementsByTag(document, "imageCoordinate");
     // The model counts tie points in 32 bits; a grid beyond that is cut.
     if (count > static_cast<std::size_t>(std::numeric_limits<int32_t>::max()))
         count = static_cast<std::size_t>(std::numeric_limits<int32_t>::max());
@@ -416,10 +417,11 @@ void ExtractGeolocationGrid(const DOMDocument *document,
                         {"longitude", &points.longitude},
                         {"height", &points.height}});
     std::string grid;
-    for (std::size_t i = 0; i < count; ++i)
-        grid +=
-            MkName("%f;%f;%f;%f;%f;", points.latitude[i], points.longitude[i],
-                   points.height[i], points.line[i], points.pixel[i]);
+    for (std::size_t i = 0; i < count; ++i) {
+        for (double value : {points.latitude[i], points.longitude[i],
+                             points.height[i], points.line[i], points.pixel[i]})
+            AppendFixedField(grid, value);
+    }
     list.Set("GeolocationGrid", grid.c_str());
 
     model->SetTiePointCount(static_cast<int32_t>(count));
@@ -458,7 +460,7 @@ std::string AttitudesText(const DOMDocument *document) {
                 double seconds = 0.0;
                 if (SameName(name, "timeStamp")) {
                     if (ParseSecondsOfDay(value, &seconds))
-                        fields += MkName("%f;", seconds);
+                        AppendFixedField(fields, seconds);
                     else
                         usable = false;
                 } else if (IsOneOf(name, {"yaw", "roll", "pitch"})) {

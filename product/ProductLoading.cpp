@@ -128,14 +128,16 @@ void FillModel(ProductReader &reader, const xercesc::DOMDocument *document,
     model.SetAcquisitionType(static_cast<int32_t>(acquisitionType));
     model.SetProductDirectory(path);
     ReadPolarizations(document, &model);
+    LookupTableFiles tableFiles;
     if (row.calibrationPermitted && CalibrationRequested(calibrationOption))
-        LoadCalibration(document, &model, calibrationOption);
+        LoadCalibration(document, &model, calibrationOption, tableFiles);
     else
         model.SetCalibrationType("None");
     ReadIncidenceAngles(document, &model,
                         productType == ProductType::SLC
                             ? IncidenceFormula::Complex
-                            : IncidenceFormula::Detected);
+                            : IncidenceFormula::Detected,
+                        tableFiles);
     ReadLooks(document, &model);
     ExtractProductMetadata(reader, document, &model);
     ReadRationalFunctions(reader, document, &model);

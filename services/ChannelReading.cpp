@@ -4,6 +4,7 @@
 
 #include "model/ZirOdi2CalibImage.hpp"
 
+#include "host/ErrorReports.hpp"
 #include "host/RasterServices.hpp"
 #include "host/TextServices.hpp"
 
@@ -15,6 +16,7 @@
 #include <limits>
 #include <map>
 #include <memory>
+#include <new>
 #include <strings.h>
 #include <vector>
 
@@ -51,11 +53,32 @@ std::size_t ElementCount(int64_t count1, int64_t count2, int64_t count3 = 1) {
     return a * b * c;
 }
 
-// Scratch memory of the host allocator, or null when it cannot be had.
+// The report of a read that could not get its scratch memory.
+constexpr int32_t kErrOutOfMemory = 12;
+
+// Scratch memory of the host allocator. Memory that cannot be had (count 0
+// stands for a size too large to address) throws std::bad_alloc, which the
+// reads turn into an error report: a read must not go on without its
+// scratch, nor end silently with the caller's buffer half written.
 template <typename T> HostArray<T> AllocateHost(std::size_t count) {
-    if (count == 0)
-        return nullptr;
-    return HostArray<T>(static_cast<T *>(HMalloc(count * sizeof(T))));
+    HostArray<T> memory(
+        count == 0 ? nullptr : static_cast<T *>(HMalloc(count * sizeof(T))));
+    if (!memory)
+        throw std::bad_alloc();
+    return memory;
+}
+
+// Runs a read; running out of memory anywhere in it, in the host allocator
+// or a container, ends the request with an error naming the product.
+template <typename Read>
+void ReportingOutOfMemory(const ZirOdi2CalibImage &model, Read read) {
+    try {
+        read();
+    } catch (const std::bad_alloc &) {
+        const char *product = model.GetProductDirectory();
+        IMPError(kErrOutOfMemory, host::kError, "out of memory reading %s",
+                 product != nullptr ? product : "");
+    }
 }
 
 // A null calibration kind means no table was ever selected, the same as
@@ -137,8 +160,6 @@ void ReadDetectedPlanes(ZirOdi2CalibImage &model, int32_t mode, int32_t xOffset,
         if (record == nullptr || planes.count(channel) != 0)
             continue;
         HostArray<float> plane = AllocateHost<float>(pixels);
-        if (!plane)
-            return;
         FILE *image = ChannelImage(model, channel);
         if (image == nullptr) {
             // Nothing is read for a channel without an image file; its
@@ -257,8 +278,6 @@ void ReadComplexReal(ZirOdi2CalibImage &model, int32_t mode, int32_t xOffset,
         static_cast<std::size_t>(ySize)));
     HostArray<int32_t> slice = AllocateHost<int32_t>(
         ElementCount(static_cast<int64_t>(rowElements), sliceRows));
-    if (!slice)
-        return;
     const ColumnMap columns = MapComplexColumns(model.CalibrationTable(),
                                                 xOffset, xSize, bufferXSize);
     for (int32_t c = 0; c < channelCount; ++c) {
@@ -268,6 +287,35 @@ void ReadComplexReal(ZirOdi2CalibImage &model, int32_t mode, int32_t xOffset,
         ReadComplexChannel(image, mode, xOffset, yOffset, xSize, ySize, buffer,
                            bufferYSize, columns, channelCount, c, slice.get(),
                            sliceRows);
+    }
+}
+
+// The integer read: detected samples as they are, complex ones packed into
+// one word each.
+void ReadIntegerSamples(ZirOdi2CalibImage &model, int32_t mode, int32_t xOffset,
+                        int32_t yOffset, int32_t xSize, int32_t ySize,
+                        int32_t *buffer, int32_t bufferXSize,
+                        int32_t bufferYSize, int32_t channelCount,
+                        const int32_t *channelList) {
+    const bool complex =
+        model.GetProductType() == static_cast<int32_t>(ProductType::SLC);
+    const int32_t samplesPerPixel = complex ? 2 : 1;
+    const std::size_t pixels = ElementCount(bufferXSize, bufferYSize);
+    HostArray<int32_t> scratch = AllocateHost<int32_t>(
+        ElementCount(bufferXSize, bufferYSize, samplesPerPixel));
+    const auto stride = static_cast<std::size_t>(channelCount);
+    for (int32_t c = 0; c < channelCount; ++c) {
+        FILE *image = ChannelImage(model, channelList[c]);
+        if (image == nullptr)
+            continue;
+        VXBInt32ChanIO(image, mode, xOffset, yOffset, xSize, ySize,
+                       scratch.get(), bufferXSize, bufferYSize, samplesPerPixel,
+                       kComplexChannels);
+        const int32_t *in = scratch.get();
+        int32_t *out = buffer + c;
+        for (std::size_t p = 0; p < pixels; ++p)
+            out[p * stride] =
+                complex ? PackComplex(in[2 * p], in[2 * p + 1]) : in[p];
     }
 }
 
@@ -286,28 +334,10 @@ void ZirOdi2CalibImage::ReadIntegerChannels(
     if (!ValidRequest(xSize, ySize, bufferXSize, bufferYSize, channelCount,
                       channelList))
         return;
-    const bool complex =
-        GetProductType() == static_cast<int32_t>(ProductType::SLC);
-    const int32_t samplesPerPixel = complex ? 2 : 1;
-    const std::size_t pixels = ElementCount(bufferXSize, bufferYSize);
-    HostArray<int32_t> scratch = AllocateHost<int32_t>(
-        ElementCount(bufferXSize, bufferYSize, samplesPerPixel));
-    if (!scratch)
-        return;
-    const auto stride = static_cast<std::size_t>(channelCount);
-    for (int32_t c = 0; c < channelCount; ++c) {
-        FILE *image = ChannelImage(*this, channelList[c]);
-        if (image == nullptr)
-            continue;
-        VXBInt32ChanIO(image, mode, xOffset, yOffset, xSize, ySize,
-                       scratch.get(), bufferXSize, bufferYSize, samplesPerPixel,
-                       kComplexChannels);
-        const int32_t *in = scratch.get();
-        int32_t *out = buffer + c;
-        for (std::size_t p = 0; p < pixels; ++p)
-            out[p * stride] =
-                complex ? PackComplex(in[2 * p], in[2 * p + 1]) : in[p];
-    }
+    ReportingOutOfMemory(*this, [&] {
+        ReadIntegerSamples(*this, mode, xOffset, yOffset, xSize, ySize, buffer,
+                           bufferXSize, bufferYSize, channelCount, channelList);
+    });
 }
 
 void ZirOdi2CalibImage::ReadRealChannels(
@@ -320,14 +350,19 @@ void ZirOdi2CalibImage::ReadRealChannels(
     if (!ValidRequest(xSize, ySize, bufferXSize, bufferYSize, channelCount,
                       channelList))
         return;
-    if (GetProductType() == static_cast<int32_t>(ProductType::SLC)) {
-        ReadComplexReal(*this, mode, xOffset, yOffset, xSize, ySize, buffer,
-                        bufferXSize, bufferYSize, channelCount, channelList);
-        return;
-    }
-    PlaneSet planes;
-    ReadDetectedPlanes(*this, mode, xOffset, yOffset, xSize, ySize, planes,
-                       bufferXSize, bufferYSize, channelCount, channelList);
-    InterleavePlanes(buffer, planes, bufferXSize, bufferYSize, channelCount,
-                     channelList);
+    ReportingOutOfMemory(*this, [&] {
+        if (GetProductType() == static_cast<int32_t>(ProductType::SLC)) {
+            ReadComplexReal(*this, mode, xOffset, yOffset, xSize, ySize, buffer,
+                            bufferXSize, bufferYSize, channelCount,
+                            channelList);
+            return;
+        }
+        // Every plane is read before the caller's buffer is written, so a
+        // read that runs out of memory leaves the buffer untouched.
+        PlaneSet planes;
+        ReadDetectedPlanes(*this, mode, xOffset, yOffset, xSize, ySize, planes,
+                           bufferXSize, bufferYSize, channelCount, channelList);
+        InterleavePlanes(buffer, planes, bufferXSize, bufferYSize, channelCount,
+                         channelList);
+    });
 }

@@ -1,3 +1,17 @@
+// Georeferencing of a product: its projection record, an affine UTM
+// transform fitted to the geolocation grid, and its ground control points.
+//
+// Pixel convention. The host's affine transform (ProjInfo_t.transform) is
+// pixel-is-area: applied to (column, line) it gives the corner of pixels,
+// so (0, 0) is the outer corner of the first pixel and the centre of pixel
+// (c, l) lies at (c + 0.5, l + 0.5). Ground control points handed out by the
+// host use the same raster positions, the first pixel centre at (0.5, 0.5),
+// as the GeoTIFF tie points of the image files do. The tie points of the
+// product description instead give pixel centres at integer positions
+// ("product coordinates"). So the fit runs in product coordinates, the
+// transform is taken at the image corners (-0.5, -0.5) and so on, and the
+// tie points go out as ground control points shifted by half a pixel.
+
 #include "host/ProjectionServices.hpp"
 #include "host/RasterServices.hpp"
 #include "host/StringLists.hpp"
@@ -19,6 +33,8 @@ constexpr const char *kGcpGroundGeosys = "LONG      WGS84";
 constexpr const char *kMetreUnits = "METER";
 // Degree asked of the fit; the host lowers it to what the points support.
 constexpr int32_t kFitOrder = 5;
+// Product coordinates of a pixel centre plus this give its raster position.
+constexpr double kCentreOffset = 0.5;
 
 // The tie points of the model, usable only when every array is present (a
 // setter refuses a missing source and leaves its array null).
@@ -125,11 +141,14 @@ int32_t ZirOdi2CalibImage::GeoReference(ProjInfo_t *record) {
                        nullptr) != 0)
         return DecodeGeosys(record->geosys, nullptr);
 
-    // The affine transform through three corners of the image: the fit may be
-    // curved, the record holds only its plane through these corners.
-    const MapPoint upperLeft = MapOf(fit, 0.0, 0.0);
-    const MapPoint upperRight = MapOf(fit, columns, 0.0);
-    const MapPoint lowerLeft = MapOf(fit, 0.0, rows);
+    // The affine transform through three outer corners of the image, in
+    // product coordinates: the fit may be curved, the record holds only its
+    // plane through these corners.
+    const double left = -kCentreOffset;
+    const double top = -kCentreOffset;
+    const MapPoint upperLeft = MapOf(fit, left, top);
+    const MapPoint upperRight = MapOf(fit, left + columns, top);
+    const MapPoint lowerLeft = MapOf(fit, left, top + rows);
     const double xStepPerColumn = (upperRight.x - upperLeft.x) / columns;
     const double yStepPerLine = (lowerLeft.y - upperLeft.y) / rows;
     const double xStepPerLine = (lowerLeft.x - upperLeft.x) / rows;
@@ -162,12 +181,13 @@ void ZirOdi2CalibImage::GcpSegment(int32_t *count, char *pixelUnits,
     }
     // At most kMaxGcpSegmentPoints points, whatever the grid size: an even
     // stride keeps them spread over the whole grid, tie point 0 among them.
+    // Their positions move from product coordinates to raster positions.
     const int32_t step = std::max<int32_t>(1, (n + kMaxGcpSegmentPoints - 1) /
                                                   kMaxGcpSegmentPoints);
     int32_t written = 0;
     for (int32_t i = 0; i < n; i += step) {
-        pixels[written] = ties.pixels[i];
-        lines[written] = ties.lines[i];
+        pixels[written] = ties.pixels[i] + kCentreOffset;
+        lines[written] = ties.lines[i] + kCentreOffset;
         pixelHeights[written] = 0.0;
         longitudes[written] = ties.longitudes[i];
         latitudes[written] = ties.latitudes[i];

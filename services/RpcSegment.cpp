@@ -78,9 +78,13 @@ void ZirOdi2CalibImage::RpcBinarySegment(int32_t offset, int32_t length,
     std::memcpy(buffer, block.get(), static_cast<size_t>(copied));
 }
 
+// The length of what RpcBinarySegment serves: with an RPC model its RF
+// block, whatever RPC tags the image file carries; without one the image
+// file's own segment, or an RF block's length when there is no image to ask.
 int32_t ZirOdi2CalibImage::RpcBinaryLength() {
+    if (rationalFunctions != nullptr)
+        return kRFBlockSize;
     FILE *image = FirstImage(*this);
-    // Without an image file to ask, the length of an RF block.
     if (image == nullptr)
         return kRFBlockSize;
     return VXBGetBinaryLength(image, 1);

@@ -22,7 +22,7 @@ namespace {
 
 // The offsets of the 23 entries the driver fills.
 const std::set<size_t> kDriverOffsets = {
-    0,   32,  56,  72,  128, 136, 144, 184, 208, 272,  280,  328,
+    0,   32,  56,  72,  128, 136, 144, 184,  208,  272,  280, 328,
     400, 808, 912, 920, 928, 944, 976, 1048, 1112, 1120, 1128};
 
 constexpr unsigned char kSentinel = 0xA5;
@@ -117,8 +117,8 @@ TEST_F(RegisteredTable, unknown_handle_reads_and_descriptions_leave_outputs) {
     const int32_t channels[] = {1};
     table.IntegerChannelRead(kUnknownHandle, 0, 0, 0, 2, 2, ints.data(), 2, 2,
                              1, channels);
-    table.RealChannelRead(kUnknownHandle, 0, 0, 0, 2, 2, floats.data(), 2, 2,
-                          1, channels);
+    table.RealChannelRead(kUnknownHandle, 0, 0, 0, 2, 2, floats.data(), 2, 2, 1,
+                          channels);
     for (int32_t value : ints)
         EXPECT_EQ(value, -7);
     for (float value : floats)
@@ -187,11 +187,11 @@ TEST_F(RegisteredTable, unknown_handle_gets_each_neutral_result) {
     int32_t ids[1] = {-1};
     double v[6][1] = {};
     table.ReadGcpSegment(kUnknownHandle, 0, 1, &gcpCount, texts[0], texts[1],
-                         texts[2], texts[3], ids, v[0], v[1], v[2], v[3],
-                         v[4], v[5]);
+                         texts[2], texts[3], ids, v[0], v[1], v[2], v[3], v[4],
+                         v[5]);
     table.ReadGcpSegment(kUnknownHandle, 1, 2, &gcpCount, texts[0], texts[1],
-                         texts[2], texts[3], ids, v[0], v[1], v[2], v[3],
-                         v[4], v[5]);
+                         texts[2], texts[3], ids, v[0], v[1], v[2], v[3], v[4],
+                         v[5]);
     EXPECT_EQ(gcpCount, -1);
     EXPECT_STREQ(texts[0], "a");
 }

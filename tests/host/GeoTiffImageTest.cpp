@@ -13,10 +13,12 @@
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <iterator>
 #include <limits>
 #include <memory>
 #include <sstream>
 #include <string>
+#include <type_traits>
 #include <vector>
 
 namespace {
@@ -30,53 +32,47 @@ using rs2test::TiffSpec;
 constexpr uint32_t kWidth = 37;  // not a multiple of the 16-pixel tiles
 constexpr uint32_t kHeight = 29; // nor of the strip heights used
 
-// A pattern that differs between neighbours, lines and elements; each
-// format maps it onto its full range, signs included.
-uint64_t Pattern(uint32_t x, uint32_t y, uint32_t element) {
-    return uint64_t(x) * 37 + uint64_t(y) * 101 + uint64_t(element) * 53;
-}
-double UInt8Value(uint32_t x, uint32_t y, uint32_t e) {
-    return double(Pattern(x, y, e) % 256);
-}
-double Int8Value(uint32_t x, uint32_t y, uint32_t e) {
-    return UInt8Value(x, y, e) - 128;
-}
-double UInt16Value(uint32_t x, uint32_t y, uint32_t e) {
-    return double(Pattern(x, y, e) * 97 % 65536);
-}
-double Int16Value(uint32_t x, uint32_t y, uint32_t e) {
-    return UInt16Value(x, y, e) - 32768;
-}
-double UInt32Value(uint32_t x, uint32_t y, uint32_t e) {
-    return double(Pattern(x, y, e) * 2654435761u % 4294967296u);
-}
-double Int32Value(uint32_t x, uint32_t y, uint32_t e) {
-    return UInt32Value(x, y, e) - 2147483648.0;
-}
-double Float32Value(uint32_t x, uint32_t y, uint32_t e) {
-    return double(Pattern(x, y, e) % 4000) * 0.25 - 500.0;
-}
-
 struct FormatCase {
     const char *name;
     uint16_t bitsPerSample;
     uint16_t sampleFormat;
-    double (*value)(uint32_t, uint32_t, uint32_t); // exact in the format
+    // Element values, exact in the format: a pattern that differs between
+    // neighbours, lines and elements, spread over the format's full range
+    // (signs included) as (pattern * spread % range) * step - shift.
+    uint64_t spread, range;
+    double step, shift;
     int32_t channelType;
     int32_t channelsPerSample;
+
+    double Value(uint32_t x, uint32_t y, uint32_t element) const {
+        const uint64_t pattern =
+            uint64_t(x) * 37 + uint64_t(y) * 101 + uint64_t(element) * 53;
+        return double(pattern * spread % range) * step - shift;
+    }
+    rs2test::ElementValue Values() const {
+        return [this](uint32_t x, uint32_t y, uint32_t e) {
+            return Value(x, y, e);
+        };
+    }
 };
 
+constexpr uint64_t k2To32 = 4294967296u;
+
+// clang-format off
 const FormatCase kFormats[] = {
-    {"uint8", 8, SAMPLEFORMAT_UINT, UInt8Value, kChanUInt8, 1},
-    {"int8", 8, SAMPLEFORMAT_INT, Int8Value, kChanInt16, 1},
-    {"uint16", 16, SAMPLEFORMAT_UINT, UInt16Value, kChanUInt16, 1},
-    {"int16", 16, SAMPLEFORMAT_INT, Int16Value, kChanInt16, 1},
-    {"uint32", 32, SAMPLEFORMAT_UINT, UInt32Value, kChanUInt32, 1},
-    {"int32", 32, SAMPLEFORMAT_INT, Int32Value, kChanInt32, 1},
-    {"float32", 32, SAMPLEFORMAT_IEEEFP, Float32Value, kChanFloat32, 1},
-    {"complex int16", 32, SAMPLEFORMAT_COMPLEXINT, Int16Value, kChanInt16, 2},
-    {"complex int32", 64, SAMPLEFORMAT_COMPLEXINT, Int32Value, kChanInt32, 2},
+    {"uint8", 8, SAMPLEFORMAT_UINT, 1, 256, 1, 0, kChanUInt8, 1},
+    {"int8", 8, SAMPLEFORMAT_INT, 1, 256, 1, 128, kChanInt16, 1},
+    {"uint16", 16, SAMPLEFORMAT_UINT, 97, 65536, 1, 0, kChanUInt16, 1},
+    {"int16", 16, SAMPLEFORMAT_INT, 97, 65536, 1, 32768, kChanInt16, 1},
+    {"uint32", 32, SAMPLEFORMAT_UINT, 2654435761u, k2To32, 1, 0, kChanUInt32, 1},
+    {"int32", 32, SAMPLEFORMAT_INT, 2654435761u, k2To32, 1, 2147483648.0, kChanInt32, 1},
+    {"float32", 32, SAMPLEFORMAT_IEEEFP, 1, 4000, 0.25, 500, kChanFloat32, 1},
+    {"complex int16", 32, SAMPLEFORMAT_COMPLEXINT, 97, 65536, 1, 32768, kChanInt16, 2},
+    {"complex int32", 64, SAMPLEFORMAT_COMPLEXINT, 2654435761u, k2To32, 1, 2147483648.0, kChanInt32, 2},
 };
+// clang-format on
+const FormatCase &kUInt8 = kFormats[0];
+const FormatCase &kUInt16 = kFormats[2];
 
 struct LayoutCase {
     const char *name;
@@ -131,25 +127,17 @@ int32_t ExpectedInt(double value) {
         std::clamp(std::round(value), -2147483648.0, 2147483647.0));
 }
 
-void Read(GeoTiffImage &image, const WindowRequest &window,
-          const std::vector<int32_t> &channels, float *out) {
-    image.ReadReal32(window, channels, out);
-}
-
-void Read(GeoTiffImage &image, const WindowRequest &window,
-          const std::vector<int32_t> &channels, int32_t *out) {
-    image.ReadInt32(window, channels, out);
-}
-
 // Reads a window and compares every output value with the value the file
 // was written from, at the pixel the resampling rule names.
 template <typename Out>
-void ExpectWindow(GeoTiffImage &image,
-                  double (*value)(uint32_t, uint32_t, uint32_t),
+void ExpectWindow(GeoTiffImage &image, const rs2test::ElementValue &value,
                   Out (*expected)(double), const WindowRequest &w,
                   const std::vector<int32_t> &channels) {
     std::vector<Out> out(size_t(w.dstx) * w.dsty * channels.size());
-    Read(image, w, channels, out.data());
+    if constexpr (std::is_same_v<Out, float>)
+        image.ReadReal32(w, channels, out.data());
+    else
+        image.ReadInt32(w, channels, out.data());
     size_t mismatches = 0;
     std::ostringstream first;
     size_t i = 0;
@@ -176,7 +164,7 @@ TEST(GeoTiffImage, windows_match_the_written_samples_in_every_layout) {
         for (const LayoutCase &layout : kLayouts) {
             SCOPED_TRACE(std::string(format.name) + ", " + layout.name);
             const std::string path = dir.File("image.tif");
-            rs2test::WriteTiff(path, SpecFor(format, layout), format.value);
+            rs2test::WriteTiff(path, SpecFor(format, layout), format.Values());
             std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
             const int32_t last = 2 * format.channelsPerSample;
             ASSERT_EQ(image->ChannelCount(), last);
@@ -195,9 +183,9 @@ TEST(GeoTiffImage, windows_match_the_written_samples_in_every_layout) {
                 {{5, 4, 6, 5, 17, 11}, {2, 2, 1}},       // up-sampled
             };
             for (const auto &read : reads) {
-                ExpectWindow(*image, format.value, ExpectedReal, read.window,
+                ExpectWindow(*image, format.Values(), ExpectedReal, read.window,
                              read.channels);
-                ExpectWindow(*image, format.value, ExpectedInt, read.window,
+                ExpectWindow(*image, format.Values(), ExpectedInt, read.window,
                              read.channels);
             }
         }
@@ -239,6 +227,18 @@ void ExpectReadFailsWritingNothing(GeoTiffImage &image,
     EXPECT_EQ(ints, Sentinels<int32_t>(count));
 }
 
+// Expects call to raise a reported error whose message names path.
+template <typename Call>
+void ExpectErrorNaming(const std::string &path, Call call) {
+    try {
+        call();
+        ADD_FAILURE() << "no error reported";
+    } catch (const ReportedError &error) {
+        EXPECT_NE(std::string(error.what()).find(path), std::string::npos)
+            << error.what();
+    }
+}
+
 TEST(GeoTiffImage, decodes_only_the_blocks_a_window_needs) {
     struct Case {
         const char *what;
@@ -248,32 +248,25 @@ TEST(GeoTiffImage, decodes_only_the_blocks_a_window_needs) {
         WindowRequest avoiding;          // samples none of them
         WindowRequest needing;           // samples some of them
     };
+    // clang-format off
     const Case cases[] = {
-        {"odd strips",
-         1,
-         0,
-         {1, 3, 5, 7, 9, 11, 13, 15, 17, 19, 21, 23, 25, 27},
-         {0, 0, 37, 28, 37, 14},
-         {0, 0, 37, 29, 37, 29}},
-        {"middle tile column",
-         0,
-         16,
-         {1, 4},
-         {32, 0, 5, 29, 5, 29},
-         {10, 0, 10, 5, 10, 5}},
+        {"odd strips", 1, 0, {1, 3, 5, 7, 9, 11, 13, 15, 17, 19, 21, 23, 25, 27},
+         {0, 0, 37, 28, 37, 14}, {0, 0, 37, 29, 37, 29}},
+        {"middle tile column", 0, 16, {1, 4}, {32, 0, 5, 29, 5, 29}, {10, 0, 10, 5, 10, 5}},
     };
+    // clang-format on
     TempDir dir;
     for (const Case &c : cases) {
         SCOPED_TRACE(c.what);
         const LayoutCase layout = {c.what,         kContig,        kDeflate,
                                    PREDICTOR_NONE, c.rowsPerStrip, c.tileSize,
                                    false};
-        const FormatCase &format = kFormats[2];
         const std::string path = dir.File("corrupt.tif");
-        rs2test::WriteTiff(path, SpecFor(format, layout), format.value);
+        rs2test::WriteTiff(path, SpecFor(kUInt16, layout), kUInt16.Values());
         Corrupt(path, c.corrupted);
         std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
-        ExpectWindow(*image, format.value, ExpectedReal, c.avoiding, {2, 1});
+        ExpectWindow(*image, kUInt16.Values(), ExpectedReal, c.avoiding,
+                     {2, 1});
         ExpectReadFailsWritingNothing(*image, c.needing, {2, 1});
     }
 }
@@ -281,8 +274,7 @@ TEST(GeoTiffImage, decodes_only_the_blocks_a_window_needs) {
 TEST(GeoTiffImage, refuses_bad_requests_without_writing) {
     TempDir dir;
     const std::string path = dir.File("image.tif");
-    rs2test::WriteTiff(path, SpecFor(kFormats[2], kLayouts[0]),
-                       kFormats[2].value);
+    rs2test::WriteTiff(path, SpecFor(kUInt16, kLayouts[0]), kUInt16.Values());
     std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
     const int32_t big = std::numeric_limits<int32_t>::max();
     struct Case {
@@ -290,6 +282,7 @@ TEST(GeoTiffImage, refuses_bad_requests_without_writing) {
         WindowRequest window;
         std::vector<int32_t> channels;
     };
+    // clang-format off
     const Case cases[] = {
         {"left of the image", {-1, 0, 5, 5, 5, 5}, {1}},
         {"above the image", {0, -1, 5, 5, 5, 5}, {1}},
@@ -304,21 +297,16 @@ TEST(GeoTiffImage, refuses_bad_requests_without_writing) {
         {"channel past the last", {0, 0, 5, 5, 5, 5}, {3}},
         {"negative channel", {0, 0, 5, 5, 5, 5}, {-1}},
         {"no channel", {0, 0, 5, 5, 5, 5}, {}},
-        {"output beyond addressable memory",
-         {0, 0, 5, 5, big, big},
-         {1, 1, 1, 1}},
+        {"output beyond addressable memory", {0, 0, 5, 5, big, big}, {1, 1, 1, 1}},
     };
+    // clang-format on
     for (const Case &c : cases) {
         SCOPED_TRACE(c.what);
         ExpectReadFailsWritingNothing(*image, c.window, c.channels);
     }
-    try {
+    ExpectErrorNaming(path, [&] {
         image->ReadReal32({0, 0, 0, 1, 1, 1}, {1}, nullptr);
-        ADD_FAILURE() << "a null output buffer was accepted";
-    } catch (const ReportedError &error) {
-        EXPECT_EQ(error.reportClass, host::kError);
-        EXPECT_NE(std::string(error.what()).find(path), std::string::npos);
-    }
+    });
     EXPECT_THROW(image->ReadInt32({0, 0, 5, 5, 5, 5}, {1}, nullptr),
                  ReportedError);
 }
@@ -334,14 +322,13 @@ TEST(GeoTiffImage, refuses_files_it_cannot_decode) {
         uint16_t sampleFormat;
         uint16_t photometric;
     };
+    constexpr uint16_t kGrey = PHOTOMETRIC_MINISBLACK;
     const Case cases[] = {
-        {"1-bit samples", 1, SAMPLEFORMAT_UINT, PHOTOMETRIC_MINISBLACK},
-        {"12-bit samples", 12, SAMPLEFORMAT_UINT, PHOTOMETRIC_MINISBLACK},
-        {"64-bit floats", 64, SAMPLEFORMAT_IEEEFP, PHOTOMETRIC_MINISBLACK},
-        {"complex floats", 64, SAMPLEFORMAT_COMPLEXIEEEFP,
-         PHOTOMETRIC_MINISBLACK},
-        {"complex 8-bit integers", 16, SAMPLEFORMAT_COMPLEXINT,
-         PHOTOMETRIC_MINISBLACK},
+        {"1-bit samples", 1, SAMPLEFORMAT_UINT, kGrey},
+        {"12-bit samples", 12, SAMPLEFORMAT_UINT, kGrey},
+        {"64-bit floats", 64, SAMPLEFORMAT_IEEEFP, kGrey},
+        {"complex floats", 64, SAMPLEFORMAT_COMPLEXIEEEFP, kGrey},
+        {"complex 8-bit integers", 16, SAMPLEFORMAT_COMPLEXINT, kGrey},
         {"subsampled YCbCr", 8, SAMPLEFORMAT_UINT, PHOTOMETRIC_YCBCR},
     };
     TempDir dir;
@@ -356,24 +343,17 @@ TEST(GeoTiffImage, refuses_files_it_cannot_decode) {
         spec.samplesPerPixel = c.photometric == PHOTOMETRIC_YCBCR ? 3 : 1;
         spec.rowsPerStrip = 16;
         const std::string path = dir.File("unsupported.tif");
-        rs2test::WriteTiff(path, spec, UInt8Value);
+        rs2test::WriteTiff(path, spec, kUInt8.Values());
         EXPECT_TRUE(host::HasTiffSignature(path));
-        try {
-            GeoTiffImage::Open(path);
-            ADD_FAILURE() << "opened";
-        } catch (const ReportedError &error) {
-            EXPECT_NE(std::string(error.what()).find(path), std::string::npos)
-                << error.what();
-        }
+        ExpectErrorNaming(path, [&] { GeoTiffImage::Open(path); });
     }
-    const std::string text = dir.File("notes.tif");
-    WriteText(text, "this is not an image\n"); // no TIFF signature
-    EXPECT_FALSE(host::HasTiffSignature(text));
-    EXPECT_THROW(GeoTiffImage::Open(text), ReportedError);
-    const std::string empty = dir.File("empty.tif");
-    WriteText(empty, ""); // no bytes at all
-    EXPECT_FALSE(host::HasTiffSignature(empty));
-    EXPECT_THROW(GeoTiffImage::Open(empty), ReportedError);
+    // No TIFF signature: text, no bytes at all.
+    for (const char *text : {"this is not an image\n", ""}) {
+        const std::string path = dir.File("notes.tif");
+        WriteText(path, text);
+        EXPECT_FALSE(host::HasTiffSignature(path));
+        EXPECT_THROW(GeoTiffImage::Open(path), ReportedError);
+    }
     EXPECT_THROW(GeoTiffImage::Open(dir.File("missing.tif")), ReportedError);
 }
 
@@ -381,7 +361,7 @@ TEST(GeoTiffImage, truncated_file_fails_to_open_or_to_read) {
     TempDir dir;
     const std::string path = dir.File("cut.tif");
     rs2test::WriteTiff(path, SpecFor(kFormats[3], kLayouts[5]),
-                       kFormats[3].value);
+                       kFormats[3].Values());
     // The second half, with the directory libtiff writes last, is gone.
     std::filesystem::resize_file(path, std::filesystem::file_size(path) / 2);
     std::unique_ptr<GeoTiffImage> image;
@@ -394,60 +374,37 @@ TEST(GeoTiffImage, truncated_file_fails_to_open_or_to_read) {
     ExpectReadFailsWritingNothing(*image, {0, 0, 37, 29, 37, 29}, {1, 2});
 }
 
-// A little-endian 8-bit TIFF written byte by byte, in two strips of which
-// the second starts at the end of the file: its data is missing.
-void WriteTiffMissingSecondStrip(const std::string &path, uint16_t width,
-                                 uint16_t height) {
-    const uint32_t stripBytes = uint32_t(width) * height / 2;
-    const uint32_t arrays = 8 + 2 + 9 * 12 + 4; // after header and directory
-    const uint32_t data = arrays + 16;
-    std::string bytes = "II";
-    auto put16 = [&bytes](uint32_t v) {
-        bytes += char(v & 0xFF);
-        bytes += char((v >> 8) & 0xFF);
-    };
-    auto put32 = [&put16](uint32_t v) {
-        put16(v & 0xFFFF);
-        put16(v >> 16);
-    };
-    auto entry = [&](uint16_t tag, uint16_t type, uint32_t count,
-                     uint32_t value) {
-        put16(tag);
-        put16(type);
-        put32(count);
-        put32(value); // a SHORT value sits in the low half
-    };
-    put16(42);
-    put32(8);
-    put16(9);
-    entry(256, 3, 1, width);
-    entry(257, 3, 1, height);
-    entry(258, 3, 1, 8);
-    entry(259, 3, 1, 1);
-    entry(262, 3, 1, 1);
-    entry(273, 4, 2, arrays);
-    entry(277, 3, 1, 1);
-    entry(278, 3, 1, height / 2u);
-    entry(279, 4, 2, arrays + 8);
-    put32(0);
-    put32(data);
-    put32(data + stripBytes);
-    put32(stripBytes);
-    put32(stripBytes);
-    for (uint32_t i = 0; i < stripBytes; ++i)
-        bytes += char(i % 251);
-    WriteText(path, bytes);
+std::string LittleEndian32(uint64_t value) {
+    std::string bytes;
+    for (int i = 0; i < 4; ++i)
+        bytes += char((value >> (8 * i)) & 0xFF);
+    return bytes;
 }
 
 TEST(GeoTiffImage, missing_uncompressed_strip_is_refused_before_writing) {
     TempDir dir;
     const std::string path = dir.File("short.tif");
-    WriteTiffMissingSecondStrip(path, 10, 8);
+    TiffSpec spec;
+    spec.width = 10;
+    spec.height = 8;
+    spec.bitsPerSample = 8;
+    spec.rowsPerStrip = 4;
+    const rs2test::ElementValue value = [](uint32_t x, uint32_t y, uint32_t) {
+        return double(y * 10 + x);
+    };
+    rs2test::WriteTiff(path, spec, value);
+    // Point the second strip at the end of the file: its data is missing.
+    const auto strips = rs2test::StoredBlocks(path);
+    ASSERT_EQ(strips.size(), 2u);
+    std::ifstream in(path, std::ios::binary);
+    std::string bytes{std::istreambuf_iterator<char>(in), {}};
+    const size_t offsets = bytes.find(LittleEndian32(strips[0].first) +
+                                      LittleEndian32(strips[1].first));
+    ASSERT_NE(offsets, std::string::npos);
+    bytes.replace(offsets + 4, 4, LittleEndian32(bytes.size()));
+    WriteText(path, bytes);
     std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
-    ExpectWindow(
-        *image,
-        +[](uint32_t x, uint32_t y, uint32_t) { return double(y * 10 + x); },
-        ExpectedInt, {0, 0, 10, 4, 10, 4}, {1});
+    ExpectWindow(*image, value, ExpectedInt, {0, 0, 10, 4, 10, 4}, {1});
     ExpectReadFailsWritingNothing(*image, {0, 0, 10, 8, 10, 8}, {1});
 }
 
@@ -513,13 +470,13 @@ TEST(GeoTiffImage, georeferencing_gives_the_system_transform_and_tie_points) {
     TempDir dir;
     for (const Case &c : cases) {
         SCOPED_TRACE(c.what);
-        TiffSpec spec = SpecFor(kFormats[0], kLayouts[0]);
+        TiffSpec spec = SpecFor(kUInt8, kLayouts[0]);
         spec.geoKeys = c.keys;
         spec.pixelScale = c.pixelScale;
         spec.tiePoints = c.tiePoints;
         spec.transformMatrix = c.matrix;
         const std::string path = dir.File("geo.tif");
-        rs2test::WriteTiff(path, spec, UInt8Value);
+        rs2test::WriteTiff(path, spec, kUInt8.Values());
         std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
         const ProjInfo_t projection = image->Projection();
         EXPECT_STREQ(projection.geosys, c.geosys);
@@ -558,10 +515,10 @@ std::vector<double> RpcValues() {
 
 std::unique_ptr<GeoTiffImage> OpenWithRpc(const TempDir &dir,
                                           const std::vector<double> &values) {
-    TiffSpec spec = SpecFor(kFormats[2], kLayouts[0]);
+    TiffSpec spec = SpecFor(kUInt16, kLayouts[0]);
     spec.rpcCoefficients = values;
     const std::string path = dir.File("rpc.tif");
-    rs2test::WriteTiff(path, spec, UInt16Value);
+    rs2test::WriteTiff(path, spec, kUInt16.Values());
     return GeoTiffImage::Open(path);
 }
 

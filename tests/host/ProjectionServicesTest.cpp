@@ -119,20 +119,15 @@ TEST(UTMZone,
         EXPECT_EQ(zone, c.zone) << c.longitude << ", " << c.latitude;
         EXPECT_EQ(band, c.band) << c.longitude << ", " << c.latitude;
     }
-}
-
-TEST(UTMZone, names_every_band_from_c_to_x_without_i_and_o) {
+    // Every band from C to X, without I and O, in the middle of its 8 degrees.
     const std::string letters = "CDEFGHJKLMNPQRSTUVWX";
     for (size_t i = 0; i < letters.size(); ++i) {
-        const double middle = -80.0 + 8.0 * i + 4.0;
         int32_t zone = 0;
         char band = '?';
-        UTMZone(-100.0, middle, &zone, &band);
-        EXPECT_EQ(band, letters[i]) << middle;
+        UTMZone(-100.0, -76.0 + 8.0 * i, &zone, &band);
+        EXPECT_EQ(band, letters[i]) << i;
     }
-}
-
-TEST(UTMZone, gives_no_zone_for_a_non_finite_point) {
+    // No zone for a point that is not finite.
     int32_t zone = -1;
     char band = '?';
     UTMZone(std::nan(""), 10.0, &zone, &band);
@@ -140,41 +135,30 @@ TEST(UTMZone, gives_no_zone_for_a_non_finite_point) {
     EXPECT_EQ(band, '\0');
 }
 
-TEST(GCTPSimpleTransform,
-     carries_points_on_a_central_meridian_to_the_meridian_arc) {
+TEST(GCTPSimpleTransform, carries_points_on_a_central_meridian_to_its_arc) {
     struct Case {
+        const char *source;
         double longitude, latitude;
         const char *utm;
-    } cases[] = {{-123.0, 49.0, "UTM 10 U D000"},
-                 {-123.0, 49.0, "UTM 10 D000"},
-                 {9.0, 60.5, "UTM 32 V D000"},
-                 {-75.0, 1.0, "UTM 18 N D000"}};
+    } cases[] = {{"LONG D000", -123.0, 49.0, "UTM 10 U D000"},
+                 {"LONG D000", -123.0, 49.0, "UTM 10 D000"},
+                 {"LON D000", -123.0, 49.0, "UTM 10 U D000"},
+                 {"LONG D000", 9.0, 60.5, "UTM 32 V D000"},
+                 {"LONG D000", -75.0, 1.0, "UTM 18 N D000"},
+                 {"LONG D000", -75.0, -1.0, "UTM 18 M D000"},
+                 // Bands C to M take the southern false northing.
+                 {"LONG D000", 21.0, -30.0, "UTM 34 J D000"}};
     for (const Case &c : cases) {
+        SCOPED_TRACE(std::string(c.source) + " to " + c.utm);
         double easting = 0.0;
         double northing = 0.0;
-        ASSERT_EQ(GCTPSimpleTransform("LONG D000", c.longitude, c.latitude,
-                                      c.utm, &easting, &northing),
-                  0)
-            << c.utm;
-        EXPECT_NEAR(easting, 500000.0, 1e-3) << c.utm;
-        EXPECT_NEAR(northing, 0.9996 * MeridianArc(c.latitude), 0.01) << c.utm;
+        ASSERT_EQ(GCTPSimpleTransform(c.source, c.longitude, c.latitude, c.utm,
+                                      &easting, &northing),
+                  0);
+        const double arc = 0.9996 * MeridianArc(c.latitude);
+        EXPECT_NEAR(easting, 500000.0, 1e-3);
+        EXPECT_NEAR(northing, c.latitude < 0 ? 10000000.0 + arc : arc, 0.01);
     }
-    double easting = 0.0;
-    double northing = 0.0;
-    ASSERT_EQ(GCTPSimpleTransform("LON D000", -123.0, 49.0, "UTM 10 U D000",
-                                  &easting, &northing),
-              0);
-    EXPECT_NEAR(northing, 5427455.781, 1e-3);
-}
-
-TEST(GCTPSimpleTransform, uses_the_southern_false_northing_for_bands_c_to_m) {
-    double easting = 0.0;
-    double northing = 0.0;
-    ASSERT_EQ(GCTPSimpleTransform("LONG D000", 21.0, -30.0, "UTM 34 J D000",
-                                  &easting, &northing),
-              0);
-    EXPECT_NEAR(easting, 500000.0, 1e-3);
-    EXPECT_NEAR(northing, 10000000.0 - 0.9996 * MeridianArc(30.0), 0.01);
 }
 
 TEST(GCTPSimpleTransform, round_trips_between_geographic_and_utm) {
@@ -215,33 +199,30 @@ TEST(GCTPSimpleTransform,
     }
 }
 
-TEST(GCPRegression2, recovers_an_exact_affine_map) {
-    const Fit fit = FitSamples(GridSamples(5, 4, Affine), 1);
-    ASSERT_EQ(fit.result, 0);
-    EXPECT_EQ(fit.order, 1);
-    EXPECT_NEAR(fit.rmsX, 0.0, 1e-6);
-    EXPECT_NEAR(fit.rmsY, 0.0, 1e-6);
-    const double probes[][2] = {{0, 0}, {2000, 0}, {0, 1500}, {123.4, 987.6}};
-    for (const auto &probe : probes) {
-        double x = 0.0, y = 0.0, expectedX = 0.0, expectedY = 0.0;
-        GCPTransform(&fit.geo, probe[0], probe[1], &x, &y);
-        Affine(probe[0], probe[1], &expectedX, &expectedY);
-        EXPECT_NEAR(x, expectedX, 1e-6);
-        EXPECT_NEAR(y, expectedY, 1e-6);
-    }
-}
-
-TEST(GCPRegression2, recovers_a_quadratic_map_from_a_higher_order_request) {
-    const Fit fit = FitSamples(GridSamples(6, 5, Quadratic), 5);
-    ASSERT_EQ(fit.result, 0);
-    EXPECT_EQ(fit.order, 5);
-    const double probes[][2] = {{17.0, 33.0}, {1999.0, 1.0}, {800.0, 1200.0}};
-    for (const auto &probe : probes) {
-        double x = 0.0, y = 0.0, expectedX = 0.0, expectedY = 0.0;
-        GCPTransform(&fit.geo, probe[0], probe[1], &x, &y);
-        Quadratic(probe[0], probe[1], &expectedX, &expectedY);
-        EXPECT_NEAR(x, expectedX, 1e-5);
-        EXPECT_NEAR(y, expectedY, 1e-5);
+TEST(GCPRegression2, recovers_an_affine_or_quadratic_map) {
+    struct Case {
+        void (*map)(double, double, double *, double *);
+        int columns, rows;
+        int32_t order;
+        double tolerance;
+    } cases[] = {{Affine, 5, 4, 1, 1e-6}, {Quadratic, 6, 5, 5, 1e-5}};
+    for (const Case &c : cases) {
+        SCOPED_TRACE(c.order);
+        const Fit fit =
+            FitSamples(GridSamples(c.columns, c.rows, c.map), c.order);
+        ASSERT_EQ(fit.result, 0);
+        EXPECT_EQ(fit.order, c.order);
+        EXPECT_NEAR(fit.rmsX, 0.0, c.tolerance);
+        EXPECT_NEAR(fit.rmsY, 0.0, c.tolerance);
+        const double probes[][2] = {
+            {0, 0}, {2000, 0}, {0, 1500}, {123.4, 987.6}, {1999, 1}};
+        for (const auto &probe : probes) {
+            double x = 0.0, y = 0.0, expectedX = 0.0, expectedY = 0.0;
+            GCPTransform(&fit.geo, probe[0], probe[1], &x, &y);
+            c.map(probe[0], probe[1], &expectedX, &expectedY);
+            EXPECT_NEAR(x, expectedX, c.tolerance);
+            EXPECT_NEAR(y, expectedY, c.tolerance);
+        }
     }
 }
 
@@ -295,7 +276,7 @@ TEST(GCPRegression2, refuses_an_empty_or_non_finite_set_of_points) {
               0);
 }
 
-TEST(ProjInfo2Parms, round_trips_every_parameter_exactly) {
+TEST(ProjInfo2Parms, round_trips_every_parameter_and_reads_missing_as_zero) {
     ProjInfo_t source;
     InitProjInfo(&source, 0);
     for (int i = 0; i < kProjParmCount; ++i)
@@ -303,24 +284,15 @@ TEST(ProjInfo2Parms, round_trips_every_parameter_exactly) {
     source.parms[5] = 1e-300;
     std::unique_ptr<char, FreeDeleter> text(ProjInfo2Parms(&source));
     ASSERT_NE(text, nullptr);
-
     ProjInfo_t copy;
     InitProjInfo(&copy, 0);
     ProjParms2Info(text.get(), &copy);
     for (int i = 0; i < kProjParmCount; ++i)
         EXPECT_EQ(copy.parms[i], source.parms[i]) << i;
-}
 
-TEST(ProjParms2Info, reads_missing_parameters_as_zero) {
-    ProjInfo_t record;
-    InitProjInfo(&record, 0);
-    for (double &parm : record.parms)
-        parm = 9.0;
-    ProjParms2Info("10 -1", &record);
-    EXPECT_EQ(record.parms[0], 10.0);
-    EXPECT_EQ(record.parms[1], -1.0);
-    for (int i = 2; i < kProjParmCount; ++i)
-        EXPECT_EQ(record.parms[i], 0.0) << i;
+    ProjParms2Info("10 -1", &copy);
+    for (int i = 0; i < kProjParmCount; ++i)
+        EXPECT_EQ(copy.parms[i], i == 0 ? 10.0 : i == 1 ? -1.0 : 0.0) << i;
 }
 
 TEST(Geosys2ProjInfo2,

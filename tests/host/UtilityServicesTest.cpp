@@ -55,15 +55,12 @@ TEST(TextServices, allocations_are_usable_for_any_size) {
     EXPECT_STREQ(copy.get(), "");
 }
 
-TEST(TextServices, mkname_texts_survive_until_the_ring_comes_round) {
+TEST(TextServices, mkname_formats_any_length_and_keeps_a_ring_of_texts) {
     std::vector<const char *> texts;
     for (int i = 0; i < kMkNameRingSize; ++i)
         texts.push_back(MkName("text %d", i));
     for (int i = 0; i < kMkNameRingSize; ++i)
         EXPECT_EQ(texts[i], "text " + std::to_string(i));
-}
-
-TEST(TextServices, mkname_formats_any_length) {
     std::string longText(100000, 'x');
     EXPECT_EQ(MkName("<%s>", longText.c_str()), "<" + longText + ">");
     EXPECT_STREQ(MkName("%.3lf;%d", 12.5, -3), "12.500;-3");
@@ -290,17 +287,14 @@ TEST(XmlPlatform, nested_pairs_keep_the_platform_until_the_last_terminate) {
     EXPECT_FALSE(PlatformIsUp());
 }
 
-TEST(XmlPlatform, platform_works_again_after_a_full_cycle) {
+TEST(XmlPlatform, platform_works_again_after_cycles_and_a_lone_terminate) {
     for (int cycle = 0; cycle < 3; ++cycle) {
         XmlPlatformPair pair;
         ASSERT_EQ(pair.result, 1);
         EXPECT_EQ(FirstText(kDocument, "b"), "caf\xC3\xA9") << cycle;
     }
     EXPECT_FALSE(PlatformIsUp());
-}
-
-TEST(XmlPlatform, unmatched_terminate_is_harmless) {
-    ORV_XMLUtil::Terminate();
+    ORV_XMLUtil::Terminate(); // unmatched: harmless
     EXPECT_EQ(ORV_XMLUtil::InitializeCount(), 0);
     XmlPlatformPair pair;
     ORV_XMLUtil::Initialize();

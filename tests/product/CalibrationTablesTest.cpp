@@ -10,6 +10,7 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdio>
 #include <cstdlib>
 #include <fstream>
 #include <memory>
@@ -79,8 +80,6 @@ TEST(CalibrationTables, look_up_table_file_packs_the_numbers_it_can_read) {
          {1, 2, 3, 0}},
         // No gains at all.
         {"<lut><offset>1</offset><gains></gains></lut>", 1.0f, {0}},
-        // The gains element is missing.
-        {"<lut><offset>1</offset></lut>", 1.0f, {0}},
         // The offset element is missing.
         {"<lut><gains>5 6</gains></lut>", 0.0f, {5, 6}},
         // An offset that is no number; text after a number; two spaces.
@@ -109,6 +108,21 @@ TEST(CalibrationTables, look_up_table_file_without_document_gives_no_table) {
     rs2test::TempDir dir;
     EXPECT_EQ(ReadLookupTableFile(dir.File("absent.xml").c_str()), nullptr);
     EXPECT_EQ(ReadLookupTableFile(nullptr), nullptr);
+    const char *const unreadable[] = {
+        // Empty.
+        "",
+        // No XML at all.
+        "1.0 2.0 3.0\n",
+        // Cut before the gains.
+        "<lut><offset>1</offset><ga",
+        // Well-formed, but without gains.
+        "<lut><offset>1</offset></lut>",
+    };
+    for (const char *file : unreadable) {
+        WriteText(dir.File("lut.xml"), file);
+        EXPECT_EQ(ReadLookupTableFile(dir.File("lut.xml").c_str()), nullptr)
+            << file;
+    }
 }
 
 TEST(CalibrationTables, option_selects_table_of_its_kind) {
@@ -166,21 +180,35 @@ TEST(CalibrationTables, missing_table_loads_without_calibration_and_warns) {
     struct Case {
         const char *what;
         std::string description;
+        const char *table; // text of lutSigma.xml; null: no such file
         std::string warning;
     };
+    const std::string sigmaOnly =
+        DescriptionNaming({{"kind=\"Sigma Nought\"", "lutSigma.xml"}});
+    const std::string unreadable =
+        "The LUT file " + dir.File("lutSigma.xml") +
+        " can not be read.\nThe image will be loaded without calibration";
     const Case cases[] = {
-        {"no lookupTable element", DescriptionNaming({}), kNoNameWarning},
-        {"no attribute of the kind",
-         DescriptionNaming({{"kind=\"Gamma\"", "lutGamma.xml"}}),
+        {"no lookupTable element", DescriptionNaming({}), nullptr,
          kNoNameWarning},
-        {"the named file is absent",
-         DescriptionNaming({{"kind=\"Sigma Nought\"", "lutSigma.xml"}}),
+        {"no attribute of the kind",
+         DescriptionNaming({{"kind=\"Gamma\"", "lutGamma.xml"}}), nullptr,
+         kNoNameWarning},
+        {"the named file is absent", sigmaOnly, nullptr,
          "The specified LUT file " + dir.File("lutSigma.xml") +
              " can not be found in the directory.\n"
              "The image will be loaded without calibration"},
+        {"the named file is no XML", sigmaOnly, "7 8 9\n", unreadable},
+        {"the named file is cut short", sigmaOnly, "<lut><offset>0</off",
+         unreadable},
+        {"the named file has no gains", sigmaOnly,
+         "<lut><offset>0</offset></lut>", unreadable},
     };
     for (const Case &c : cases) {
         WriteText(dir.File("product.xml"), c.description);
+        std::remove(dir.File("lutSigma.xml").c_str());
+        if (c.table != nullptr)
+            WriteText(dir.File("lutSigma.xml"), c.table);
         DocumentParse parse(dir.File("product.xml").c_str());
         ASSERT_NE(parse.Document(), nullptr) << c.what;
         auto model = ModelFor(dir.File("product.xml"));

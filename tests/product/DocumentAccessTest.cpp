@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 
 #include <xercesc/dom/DOMNodeList.hpp>
+#include <xercesc/util/XMLString.hpp>
 
 #include <cstdlib>
 #include <fstream>
@@ -65,38 +66,32 @@ const char *const kProduct = R"(<?xml version="1.0" encoding="UTF-8"?>
 </product>
 )";
 
-TEST(ElementText, gives_the_first_element_in_document_order_at_any_depth) {
+TEST(ElementText, gives_all_text_below_the_first_element_of_a_tag) {
     ParsedText parsed(kProduct);
     ASSERT_NE(parsed.Document(), nullptr);
-    // The nested productType comes first in the file, so it wins over the
-    // shallower one that follows.
-    EXPECT_EQ(OrNull(ElementText(parsed.Document(), "productType")), "deep");
-}
-
-TEST(ElementText, joins_all_text_below_an_element_untrimmed) {
-    ParsedText parsed(kProduct);
-    EXPECT_EQ(OrNull(ElementText(parsed.Document(), "site")),
-              " Montr\xC3\xA9"
-              "al North Vancouver ");
-    EXPECT_EQ(ElementTextTranscoded(parsed.Document(), "site").Narrow(),
-              " Montr\xC3\xA9"
-              "al North Vancouver ");
-}
-
-TEST(ElementText,
-     absent_and_empty_elements_give_empty_text_missing_input_none) {
-    ParsedText parsed(kProduct);
-    EXPECT_EQ(OrNull(ElementText(parsed.Document(), "noSuchElement")), "");
-    EXPECT_EQ(OrNull(ElementText(parsed.Document(), "emptyElement")), "");
-    // Tag names match as written, case included.
-    EXPECT_EQ(OrNull(ElementText(parsed.Document(), "PRODUCTTYPE")), "");
+    const std::pair<const char *, const char *> cases[] = {
+        // The nested productType comes first in the file, so it wins over the
+        // shallower one that follows.
+        {"productType", "deep"},
+        // The text of child elements joins in, untrimmed.
+        {"site", " Montr\xC3\xA9"
+                 "al North Vancouver "},
+        // Absent and empty elements give empty texts; tags match as written,
+        // case included.
+        {"noSuchElement", ""},
+        {"emptyElement", ""},
+        {"PRODUCTTYPE", ""},
+    };
+    for (const auto &[tag, text] : cases) {
+        EXPECT_EQ(OrNull(ElementText(parsed.Document(), tag)), text) << tag;
+        const XmlTranscode wide = ElementTextTranscoded(parsed.Document(), tag);
+        EXPECT_EQ(wide.Narrow(), text) << tag;
+        EXPECT_EQ(wide.Empty(), *text == '\0') << tag;
+    }
+    // Missing input gives no text at all.
     EXPECT_EQ(OrNull(ElementText(nullptr, "productType")), "<null>");
     EXPECT_EQ(OrNull(ElementText(parsed.Document(), nullptr)), "<null>");
-    EXPECT_TRUE(
-        ElementTextTranscoded(parsed.Document(), "noSuchElement").Empty());
     EXPECT_TRUE(ElementTextTranscoded(nullptr, "productType").Empty());
-    EXPECT_EQ(ElementTextTranscoded(parsed.Document(), "productType").Narrow(),
-              "deep");
 }
 
 TEST(FindTextByAttribute, applies_the_match_rules_to_any_attribute) {
@@ -108,35 +103,29 @@ TEST(FindTextByAttribute, applies_the_match_rules_to_any_attribute) {
         const char *pattern;
         const char *text;    // "<null>" when nothing matches
         const char *matched; // the attribute value that matched
-    } cases[] = {
-        // Equality ignores case; the first match in document order wins.
-        {"fullResolutionImageData", AttributeMatch::EqualIgnoringCase, "HH",
-         "imagery_HH.tif", "hh"},
-        {"fullResolutionImageData", AttributeMatch::EqualIgnoringCase, "Hv",
-         "imagery_HV.tif", "hv"},
-        // Equality is of the whole value.
-        {"fullResolutionImageData", AttributeMatch::EqualIgnoringCase, "H",
-         "<null>", ""},
-        {"fullResolutionImageData", AttributeMatch::EqualIgnoringCase, "VV",
-         "<null>", ""},
-        // Containment ignores case on both sides.
-        {"lookupTable", AttributeMatch::ContainsIgnoringCase, "sigma",
-         "lutSigma.xml", "Sigma Nought"},
-        {"lookupTable", AttributeMatch::ContainsIgnoringCase, "Sigma",
-         "lutSigma.xml", "Sigma Nought"},
-        {"lookupTable", AttributeMatch::ContainsIgnoringCase, "NOUGHT",
-         "lutBeta.xml", "Beta Nought"},
-        // The matching attribute need not be the first of its element.
-        {"lookupTable", AttributeMatch::ContainsIgnoringCase, "beta",
-         "lutBeta.xml", "Beta Nought"},
-        {"lookupTable", AttributeMatch::ContainsIgnoringCase, "table",
-         "lutBeta.xml", "table"},
-        {"lookupTable", AttributeMatch::EqualIgnoringCase, "gamma",
-         "lutGamma.xml", "Gamma"},
-        {"lookupTable", AttributeMatch::ContainsIgnoringCase, "elevation",
-         "<null>", ""},
-        {"noSuchTag", AttributeMatch::ContainsIgnoringCase, "a", "<null>", ""},
     };
+    constexpr AttributeMatch kEqual = AttributeMatch::EqualIgnoringCase;
+    constexpr AttributeMatch kContains = AttributeMatch::ContainsIgnoringCase;
+    // clang-format off
+    const Case cases[] = {
+        // Equality ignores case; the first match in document order wins.
+        {"fullResolutionImageData", kEqual, "HH", "imagery_HH.tif", "hh"},
+        {"fullResolutionImageData", kEqual, "Hv", "imagery_HV.tif", "hv"},
+        // Equality is of the whole value.
+        {"fullResolutionImageData", kEqual, "H", "<null>", ""},
+        {"fullResolutionImageData", kEqual, "VV", "<null>", ""},
+        // Containment ignores case on both sides.
+        {"lookupTable", kContains, "sigma", "lutSigma.xml", "Sigma Nought"},
+        {"lookupTable", kContains, "Sigma", "lutSigma.xml", "Sigma Nought"},
+        {"lookupTable", kContains, "NOUGHT", "lutBeta.xml", "Beta Nought"},
+        // The matching attribute need not be the first of its element.
+        {"lookupTable", kContains, "beta", "lutBeta.xml", "Beta Nought"},
+        {"lookupTable", kContains, "table", "lutBeta.xml", "table"},
+        {"lookupTable", kEqual, "gamma", "lutGamma.xml", "Gamma"},
+        {"lookupTable", kContains, "elevation", "<null>", ""},
+        {"noSuchTag", kContains, "a", "<null>", ""},
+    };
+    // clang-format on
     for (const Case &c : cases) {
         std::string matched;
         EXPECT_EQ(OrNull(FindTextByAttribute(parsed.Document(), c.tag, c.rule,
@@ -145,14 +134,11 @@ TEST(FindTextByAttribute, applies_the_match_rules_to_any_attribute) {
             << c.tag << " " << c.pattern;
         EXPECT_EQ(matched, c.matched) << c.tag << " " << c.pattern;
     }
-    EXPECT_EQ(
-        OrNull(FindTextByAttribute(nullptr, "lookupTable",
-                                   AttributeMatch::EqualIgnoringCase, "Gamma")),
-        "<null>");
-    EXPECT_EQ(
-        OrNull(FindTextByAttribute(parsed.Document(), "lookupTable",
-                                   AttributeMatch::EqualIgnoringCase, nullptr)),
-        "<null>");
+    EXPECT_EQ(OrNull(FindTextByAttribute(nullptr, "lookupTable", kEqual, "G")),
+              "<null>");
+    EXPECT_EQ(OrNull(FindTextByAttribute(parsed.Document(), "lookupTable",
+                                         kEqual, nullptr)),
+              "<null>");
 }
 
 // The DOM's own list of the elements of tag.
@@ -290,6 +276,46 @@ TEST(DocumentParse, uses_what_the_parser_built_despite_errors) {
     DocumentParse parse(truncated.c_str());
     ASSERT_NE(parse.Document(), nullptr);
     EXPECT_EQ(OrNull(ElementText(parse.Document(), "b")), "x");
+}
+
+// What the DOM gives as the text content of element, narrowed as the
+// lookups narrow it.
+std::string DomTextContent(const xercesc::DOMElement *element) {
+    char *narrow = xercesc::XMLString::transcode(element->getTextContent());
+    const std::string text = narrow != nullptr ? narrow : "<null>";
+    xercesc::XMLString::release(&narrow);
+    return text;
+}
+
+TEST(NodeText, gives_the_text_content_the_dom_gives) {
+    // Elements of every shape: one text node, or text split by a comment,
+    // CDATA, references, a child element; no content; text beyond ASCII.
+    ParsedText parsed("<r><plain>1.5e+02</plain>"
+                      "<spaced> a\tb\n </spaced>"
+                      "<commented>x<!-- note -->y</commented>"
+                      "<cdata><![CDATA[<raw>]]></cdata>"
+                      "<references>a&amp;b&#233;</references>"
+                      "<accented>Montr&#233;al</accented>"
+                      "<ideograph>&#x5317;</ideograph>"
+                      "<nested><i>in</i>ner</nested>"
+                      "<empty></empty><onlyComment><!-- c --></onlyComment>"
+                      "</r>");
+    ASSERT_NE(parsed.Document(), nullptr);
+    for (const char *tag :
+         {"plain", "spaced", "commented", "cdata", "references", "accented",
+          "ideograph", "nested", "empty", "onlyComment", "r"}) {
+        const xercesc::DOMElement *element =
+            FirstElementByTag(parsed.Document(), tag);
+        ASSERT_NE(element, nullptr) << tag;
+        const std::string expected = DomTextContent(element);
+        EXPECT_EQ(NodeText(element), expected) << tag;
+        EXPECT_EQ(OrNull(ElementText(parsed.Document(), tag)), expected) << tag;
+    }
+    EXPECT_EQ(NodeText(FirstElementByTag(parsed.Document(), "accented")),
+              "Montr\xC3\xA9"
+              "al");
+    EXPECT_EQ(FirstElementByTag(parsed.Document(), "noSuchElement"), nullptr);
+    EXPECT_EQ(FirstElementByTag(nullptr, "plain"), nullptr);
 }
 
 } // namespace

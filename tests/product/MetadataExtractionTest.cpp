@@ -309,9 +309,26 @@ TEST(MetadataExtraction, far_edge_follows_the_product_geometry) {
          "195.3125"},
         {"ground range product without a polynomial",
          RangeGeometry("SGF", "Increasing", "0", ""), std::nullopt},
-        {"polynomial with five of its six coefficients",
+        {"five coefficients: the sixth is 0",
          RangeGeometry("SGF", "Increasing", "0",
-                       "<groundToSlantRangeCoefficients>1 2 3 4 5"
+                       "<groundToSlantRangeCoefficients>0 0 0 0 1e-8"
+                       "</groundToSlantRangeCoefficients>"),
+         // 250^4 * 1e-8
+         "39.0625"},
+        {"three coefficients: a quadratic",
+         RangeGeometry("SGF", "Increasing", "50",
+                       "<groundToSlantRangeCoefficients>1000 2 0.5"
+                       "</groundToSlantRangeCoefficients>"),
+         "21400.0000"},
+        {"numbers up to the first text that is none",
+         RangeGeometry("SGF", "Increasing", "50",
+                       "<groundToSlantRangeCoefficients>1000 2 x 7"
+                       "</groundToSlantRangeCoefficients>"),
+         // 1000 + 2 * 200
+         "1400.0000"},
+        {"no number at all",
+         RangeGeometry("SGF", "Increasing", "0",
+                       "<groundToSlantRangeCoefficients>none"
                        "</groundToSlantRangeCoefficients>"),
          std::nullopt},
         {"no ground range origin",

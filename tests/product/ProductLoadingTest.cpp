@@ -13,11 +13,11 @@
 #include <gtest/gtest.h>
 
 #include <cstdlib>
+#include <cxxabi.h>
 #include <fstream>
 #include <memory>
 #include <string>
 #include <sys/stat.h>
-#include <typeindex>
 #include <typeinfo>
 #include <vector>
 
@@ -35,25 +35,15 @@ std::string WriteFile(const rs2test::TempDir &dir, const std::string &name,
     return path;
 }
 
-// The type name of a model, or "none".
+// The class name of a model, or "none".
 std::string ClassOf(const ZirOdi2CalibImage *model) {
     if (model == nullptr)
         return "none";
-    static const std::pair<std::type_index, const char *> kNames[] = {
-        {typeid(ZirOdi2SLC), "ZirOdi2SLC"},
-        {typeid(ZirOdi2SLCS2C), "ZirOdi2SLCS2C"},
-        {typeid(ZirOdi2SLCS4C), "ZirOdi2SLCS4C"},
-        {typeid(RUZ2GrpcCR), "RUZ2GrpcCR"},
-        {typeid(RUZ2GrpC2R), "RUZ2GrpC2R"},
-        {typeid(RUZ2GrpC4R), "RUZ2GrpC4R"},
-        {typeid(RUZ2GeocCR), "RUZ2GeocCR"},
-        {typeid(RUZ2GeocC2R), "RUZ2GeocC2R"},
-        {typeid(RUZ2GeocC4R), "RUZ2GeocC4R"},
-    };
-    for (const auto &entry : kNames)
-        if (entry.first == std::type_index(typeid(*model)))
-            return entry.second;
-    return "unexpected class";
+    int status = -1;
+    const std::unique_ptr<char, decltype(&std::free)> name(
+        abi::__cxa_demangle(typeid(*model).name(), nullptr, nullptr, &status),
+        &std::free);
+    return status == 0 ? name.get() : "unnamed class";
 }
 
 // A generated product small enough to write quickly; the image files are
@@ -176,12 +166,6 @@ TEST(LoadProduct, fills_the_model_from_the_description) {
     EXPECT_NE(model->GetRangeLooks(), nullptr);
     EXPECT_NE(*model->GetRangeLooks(), '\0');
     EXPECT_NE(model->GetAzimuthLooks(), nullptr);
-    // Calibration was asked for and is permitted.
-    EXPECT_STRNE(model->GetCalibrationType(), "None");
-    EXPECT_EQ(model->CalibrationTable().Size(),
-              static_cast<size_t>(options.width));
-    EXPECT_EQ(model->IncidenceTable().Size(),
-              static_cast<size_t>(options.width));
     EXPECT_EQ(model->ChannelCount(), 2);
     EXPECT_EQ(model->Width(), options.width);
     EXPECT_EQ(model->Height(), options.height);
@@ -270,9 +254,8 @@ TEST(LoadProduct, loads_the_real_single_look_complex_product) {
               static_cast<int32_t>(AcquisitionType::Fine));
     EXPECT_STREQ(model->GetCalibrationType(), "None");
     ASSERT_NE(model->FindBand(0), nullptr);
-    EXPECT_EQ(model->FindBand(1), nullptr);
-    EXPECT_EQ(model->FindBand(2), nullptr);
-    EXPECT_EQ(model->FindBand(3), nullptr);
+    for (int32_t code = 1; code < 4; ++code)
+        EXPECT_EQ(model->FindBand(code), nullptr) << code;
     EXPECT_STREQ(model->FindBand(0)->fileName, "imagery_HH.tif");
     EXPECT_EQ(model->ChannelCount(), 1);
     EXPECT_STREQ(model->FindChannel(1)->description, "Matrix_Element: _1_1");
@@ -308,35 +291,24 @@ TEST(ReadPolarizations, registers_one_band_per_recognised_name) {
         std::string images;
         // The file name of each code 0..3; null: no band.
         std::vector<const char *> files;
-    } cases[] = {
-        {"HH HV",
-         Images({{"HH", "a.tif"}, {"HV", "b.tif"}}),
-         {"a.tif", nullptr, "b.tif", nullptr}},
-        {"HH VV HV VH",
-         Images({{"VH", "vh"}, {"HV", "hv"}, {"VV", "vv"}, {"HH", "hh"}}),
-         {"hh", "vh", "hv", "vv"}},
+    };
+    // clang-format off
+    const Case cases[] = {
+        {"HH HV", Images({{"HH", "a.tif"}, {"HV", "b.tif"}}), {"a.tif", nullptr, "b.tif", nullptr}},
+        {"HH VV HV VH", Images({{"VH", "vh"}, {"HV", "hv"}, {"VV", "vv"}, {"HH", "hh"}}), {"hh", "vh", "hv", "vv"}},
         // An empty token between two spaces is skipped.
-        {"HH  HV",
-         Images({{"HH", "a"}, {"HV", "b"}}),
-         {"a", nullptr, "b", nullptr}},
+        {"HH  HV", Images({{"HH", "a"}, {"HV", "b"}}), {"a", nullptr, "b", nullptr}},
         // Only single spaces separate: "HV\n" is no polarization name.
-        {"HH HV\n",
-         Images({{"HH", "a"}, {"HV", "b"}}),
-         {"a", nullptr, nullptr, nullptr}},
-        {"HH\tHV",
-         Images({{"HH", "a"}, {"HV", "b"}}),
-         {nullptr, nullptr, nullptr, nullptr}},
-        {"hh vv",
-         Images({{"Hh", "a"}, {"VV", "b"}}),
-         {"a", nullptr, nullptr, "b"}},
+        {"HH HV\n", Images({{"HH", "a"}, {"HV", "b"}}), {"a", nullptr, nullptr, nullptr}},
+        {"HH\tHV", Images({{"HH", "a"}, {"HV", "b"}}), {nullptr, nullptr, nullptr, nullptr}},
+        {"hh vv", Images({{"Hh", "a"}, {"VV", "b"}}), {"a", nullptr, nullptr, "b"}},
         {"HH HH", Images({{"HH", "a"}}), {"a", nullptr, nullptr, nullptr}},
         // A listed name without an image element still gets a band.
         {"HH VV", Images({{"HH", "a"}}), {"a", nullptr, nullptr, ""}},
-        {"XX HH",
-         Images({{"XX", "x"}, {"HH", "a"}}),
-         {"a", nullptr, nullptr, nullptr}},
+        {"XX HH", Images({{"XX", "x"}, {"HH", "a"}}), {"a", nullptr, nullptr, nullptr}},
         {nullptr, Images({{"HH", "a"}}), {nullptr, nullptr, nullptr, nullptr}},
     };
+    // clang-format on
     for (const Case &c : cases) {
         std::string list = c.polarizations != nullptr
                                ? std::string("<polarizations>") +
@@ -386,18 +358,6 @@ TEST(TypeNames, map_whole_names_ignoring_case) {
     }
     EXPECT_EQ(ParseProductType(nullptr), ProductType::Unknown);
     EXPECT_EQ(ParseAcquisitionType(nullptr), AcquisitionType::Unknown);
-}
-
-TEST(ReadLooks, stores_the_texts_or_empty_ones) {
-    rs2test::TempDir dir;
-    std::string path =
-        WriteFile(dir, "product.xml",
-                  "<p><numberOfRangeLooks>2</numberOfRangeLooks></p>");
-    DocumentParse parse(path.c_str());
-    RUZ2GrpcCR model;
-    ReadLooks(parse.Document(), &model);
-    EXPECT_STREQ(model.GetRangeLooks(), "2");
-    EXPECT_STREQ(model.GetAzimuthLooks(), "");
 }
 
 } // namespace

@@ -1,3 +1,4 @@
+#include "host/ErrorReports.hpp"
 #include "model/ZirOdi2CalibImage.hpp"
 #include "product/ProductReader.hpp"
 #include "tests/support/TempDir.hpp"
@@ -8,9 +9,17 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <limits>
 #include <memory>
 #include <string>
 #include <vector>
+
+// A failed allocation must come back as null, also under the address
+// sanitizer, so that the reads can report it.
+extern "C" const char *__asan_default_options();
+extern "C" const char *__asan_default_options() {
+    return "allocator_may_return_null=1";
+}
 
 namespace {
 
@@ -405,6 +414,58 @@ TEST(ChannelReading, complex_read_leaves_samples_of_undefined_channel) {
             ASSERT_FLOAT_EQ(buffer[2 * k + 2], sample.first / gains[w.x + x]);
             ASSERT_FLOAT_EQ(buffer[2 * k + 3], sample.second / gains[w.x + x]);
         }
+    }
+}
+
+TEST(ChannelReading, scratch_memory_that_cannot_be_had_is_a_reported_error) {
+    enum class Read { Integer, Real };
+    constexpr int32_t kHuge = std::numeric_limits<int32_t>::max();
+    constexpr int32_t kVast = int32_t{1} << 24; // 2^48 pixels: no allocator
+    struct Case {
+        const char *type;
+        Read read;
+        int32_t bufferSize; // width and height of the output
+    } cases[] = {
+        // A size the allocator cannot even be asked for.
+        {"SGF", Read::Integer, kHuge},
+        {"SLC", Read::Integer, kHuge},
+        {"SGF", Read::Real, kHuge},
+        // A size the allocator refuses.
+        {"SGF", Read::Integer, kVast},
+        {"SLC", Read::Integer, kVast},
+        {"SGF", Read::Real, kVast},
+    };
+    for (const Case &c : cases) {
+        SCOPED_TRACE(std::string(c.type) + " " + std::to_string(c.bufferSize));
+        rs2test::TempDir dir;
+        const auto product =
+            rs2gen::GenerateProduct(dir.Path(), Options(c.type, {"HH"}, 8, 8));
+        LoadedProduct loaded(product.productXml, nullptr);
+        ASSERT_NE(loaded.model, nullptr);
+
+        // The output buffer is a guard: the read must fail before using it.
+        std::vector<int32_t> words(16, kUntouchedWord);
+        std::vector<float> floats(16, kUntouched);
+        const int32_t channels[] = {1};
+        try {
+            if (c.read == Read::Integer)
+                loaded.model->ReadIntegerChannels(0, 0, 0, 4, 4, words.data(),
+                                                  c.bufferSize, c.bufferSize, 1,
+                                                  channels);
+            else
+                loaded.model->ReadRealChannels(0, 0, 0, 4, 4, floats.data(),
+                                               c.bufferSize, c.bufferSize, 1,
+                                               channels);
+            ADD_FAILURE() << "the read reported nothing";
+        } catch (const host::ReportedError &error) {
+            EXPECT_EQ(error.code, 12);
+            EXPECT_EQ(error.reportClass, host::kError);
+            EXPECT_EQ(std::string(error.what()),
+                      std::string("out of memory reading ") +
+                          loaded.model->GetProductDirectory());
+        }
+        EXPECT_EQ(words, std::vector<int32_t>(16, kUntouchedWord));
+        EXPECT_EQ(floats, std::vector<float>(16, kUntouched));
     }
 }
 

@@ -131,6 +131,11 @@ void ExpectProductTexts(const GcpOutput &out) {
 
 using rs2test::LoadedProduct;
 
+struct MapXY {
+    double x = 0.0;
+    double y = 0.0;
+};
+
 ProjInfo_t InitialRecord() {
     ProjInfo_t record;
     std::memset(&record, 0x5A, sizeof record);
@@ -150,12 +155,14 @@ TEST(GeoReference, fits_a_north_up_grid_with_no_rotation) {
     ProjInfo_t record = InitialRecord();
     EXPECT_EQ(model.GeoReference(&record), kGeosysUTM);
     EXPECT_STREQ(record.geosys, "UTM 10 U D000");
-    EXPECT_NEAR(record.transform[0], 480000.0, 1e-3);  // upper-left X
-    EXPECT_NEAR(record.transform[1], 10.0, 1e-6);      // X step per column
-    EXPECT_NEAR(record.transform[2], 0.0, 1e-6);       // X step per line
-    EXPECT_NEAR(record.transform[3], 5450000.0, 1e-3); // upper-left Y
-    EXPECT_NEAR(record.transform[4], 0.0, 1e-6);       // Y step per column
-    EXPECT_NEAR(record.transform[5], -12.0, 1e-6);     // Y step per line
+    // The upper-left corner lies half a pixel before the centre of pixel 0,
+    // which the grid puts at (480000, 5450000).
+    EXPECT_NEAR(record.transform[0], 480000.0 - 5.0, 1e-3); // upper-left X
+    EXPECT_NEAR(record.transform[1], 10.0, 1e-6);           // X step per column
+    EXPECT_NEAR(record.transform[2], 0.0, 1e-6);            // X step per line
+    EXPECT_NEAR(record.transform[3], 5450000.0 + 6.0, 1e-3); // upper-left Y
+    EXPECT_NEAR(record.transform[4], 0.0, 1e-6);   // Y step per column
+    EXPECT_NEAR(record.transform[5], -12.0, 1e-6); // Y step per line
     EXPECT_EQ(record.parms[0], 10.0);
     EXPECT_EQ(record.parms[1], 1.0);
 }
@@ -177,7 +184,7 @@ TEST(GeoReference, takes_the_zone_of_the_first_tie_point_for_the_whole_grid) {
     ProjInfo_t record = InitialRecord();
     EXPECT_EQ(model.GeoReference(&record), kGeosysUTM);
     EXPECT_STREQ(record.geosys, "UTM 10 U D000");
-    EXPECT_NEAR(record.transform[0], 463500.0, 1e-3);
+    EXPECT_NEAR(record.transform[0], 463500.0 - 150.0, 1e-3);
     EXPECT_NEAR(record.transform[1], 300.0, 1e-6);
 }
 
@@ -233,8 +240,9 @@ TEST(GcpSegment, thins_the_tie_points_to_at_most_256_by_an_even_stride) {
         for (int32_t k = 0; k < out.count; ++k) {
             const int32_t i = k * c.step;
             EXPECT_EQ(out.ids[k], k + 1);
-            EXPECT_EQ(out.pixels[k], grid.pixels[i]);
-            EXPECT_EQ(out.lines[k], grid.lines[i]);
+            // Raster positions: the pixel centre at + 0.5.
+            EXPECT_EQ(out.pixels[k], grid.pixels[i] + 0.5);
+            EXPECT_EQ(out.lines[k], grid.lines[i] + 0.5);
             EXPECT_EQ(out.pixelHeights[k], 0.0);
             EXPECT_EQ(out.longitudes[k], grid.longitudes[i]);
             EXPECT_EQ(out.latitudes[k], grid.latitudes[i]);
@@ -296,6 +304,25 @@ TEST(GcpSegment, gives_no_point_when_the_image_file_cannot_be_opened) {
     ExpectProductTexts(out);
 }
 
+namespace {
+
+// Easting and northing in zone 10 of a ground point of the generated scene.
+MapXY ZoneTen(const rs2gen::GroundPoint &ground) {
+    MapXY point;
+    EXPECT_EQ(GCTPSimpleTransform("LONG D000", ground.longitude,
+                                  ground.latitude, "UTM 10 U D000", &point.x,
+                                  &point.y),
+              0);
+    return point;
+}
+
+MapXY Apply(const double *t, double column, double line) {
+    return {t[0] + column * t[1] + line * t[2],
+            t[3] + column * t[4] + line * t[5]};
+}
+
+} // namespace
+
 TEST(GeoReference, puts_the_corners_of_a_generated_product_where_they_lie) {
     rs2gen::ProductOptions options;
     options.width = 200;
@@ -307,33 +334,84 @@ TEST(GeoReference, puts_the_corners_of_a_generated_product_where_they_lie) {
     ASSERT_EQ(loaded.model->GeoReference(&record), kGeosysUTM);
     EXPECT_STREQ(record.geosys, "UTM 10 U D000");
 
-    // The transform goes through three image corners exactly (up to the
-    // polynomial fit), and elsewhere misses the map, which UTM bends
-    // slightly, by a small fraction of a pixel.
+    // The transform takes raster positions, the scene product coordinates
+    // (pixel centres at integers). It goes through three outer image corners
+    // exactly (up to the polynomial fit), and elsewhere misses the map,
+    // which UTM bends slightly, by a small fraction of a pixel.
     const rs2gen::SceneGeometry scene(options);
     const double *t = record.transform;
     const double pixelSize = std::hypot(t[1], t[4]);
     struct Case {
-        double pixel, line, tolerance;
+        double column, line, tolerance; // raster position
     } cases[] = {
         {0.0, 0.0, 1e-3},
         {200.0, 0.0, 1e-3},
         {0.0, 150.0, 1e-3},
-        {100.0, 75.0, 0.05 * pixelSize},
-        {199.0, 149.0, 0.05 * pixelSize},
+        {100.5, 75.5, 0.05 * pixelSize},
+        {199.5, 149.5, 0.05 * pixelSize},
     };
     for (const Case &c : cases) {
-        const rs2gen::GroundPoint ground = scene.Ground(c.pixel, c.line);
-        double easting = 0.0;
-        double northing = 0.0;
-        ASSERT_EQ(GCTPSimpleTransform("LONG D000", ground.longitude,
-                                      ground.latitude, "UTM 10 U D000",
-                                      &easting, &northing),
-                  0);
-        EXPECT_NEAR(t[0] + c.pixel * t[1] + c.line * t[2], easting, c.tolerance)
-            << c.pixel << ", " << c.line;
-        EXPECT_NEAR(t[3] + c.pixel * t[4] + c.line * t[5], northing,
-                    c.tolerance)
-            << c.pixel << ", " << c.line;
+        const MapXY expected =
+            ZoneTen(scene.Ground(c.column - 0.5, c.line - 0.5));
+        const MapXY mapped = Apply(t, c.column, c.line);
+        EXPECT_NEAR(mapped.x, expected.x, c.tolerance)
+            << c.column << ", " << c.line;
+        EXPECT_NEAR(mapped.y, expected.y, c.tolerance)
+            << c.column << ", " << c.line;
+    }
+}
+
+TEST(GeoReference, maps_each_pixel_centre_to_its_tie_point) {
+    // A scene near the equator on the zone's central meridian, where UTM is
+    // as good as affine over a small scene, so the plane reproduces every
+    // tie point and not only the corners.
+    rs2gen::ProductOptions options;
+    options.centerLatitude = 0.1;
+    options.centerLongitude = -123.0;
+    LoadedProduct loaded(options);
+    ASSERT_NE(loaded.model, nullptr);
+    ProjInfo_t record = InitialRecord();
+    ASSERT_EQ(loaded.model->GeoReference(&record), kGeosysUTM);
+    ASSERT_STREQ(record.geosys, "UTM 10 N D000");
+
+    const rs2gen::SceneGeometry scene(options);
+    const std::vector<rs2gen::TiePoint> ties =
+        scene.TieGrid(options.tieGridColumns, options.tieGridRows);
+    ASSERT_EQ(loaded.model->GetTiePointCount(),
+              static_cast<int32_t>(ties.size()));
+    for (const rs2gen::TiePoint &tie : ties) {
+        const MapXY expected = ZoneTen(tie.ground);
+        const MapXY mapped =
+            Apply(record.transform, tie.pixel + 0.5, tie.line + 0.5);
+        EXPECT_NEAR(mapped.x, expected.x, 1e-3) << tie.pixel << "," << tie.line;
+        EXPECT_NEAR(mapped.y, expected.y, 1e-3) << tie.pixel << "," << tie.line;
+    }
+}
+
+TEST(GcpSegment, hands_out_the_points_the_image_file_gives_for_the_grid) {
+    // The generator writes the same grid into product.xml (pixel centres at
+    // integers) and into the GeoTIFF (raster positions): both must come out
+    // of the host alike.
+    rs2gen::ProductOptions options;
+    LoadedProduct loaded(options);
+    ASSERT_NE(loaded.model, nullptr);
+    ASSERT_GT(loaded.model->GetTiePointCount(), 0);
+    GcpOutput fromProduct;
+    fromProduct.ReadFrom(*loaded.model);
+    std::unique_ptr<FILE, ImageCloser> image(
+        VXBOpen(loaded.product.imageFiles[0].c_str(), "r"));
+    ASSERT_NE(image, nullptr);
+    GcpOutput fromImage;
+    fromImage.ReadFrom(image.get());
+
+    ASSERT_EQ(fromProduct.count, options.tieGridColumns * options.tieGridRows);
+    ASSERT_EQ(fromProduct.count, fromImage.count);
+    for (int32_t k = 0; k < fromProduct.count; ++k) {
+        EXPECT_NEAR(fromProduct.pixels[k], fromImage.pixels[k], 1e-9) << k;
+        EXPECT_NEAR(fromProduct.lines[k], fromImage.lines[k], 1e-9) << k;
+        EXPECT_NEAR(fromProduct.longitudes[k], fromImage.longitudes[k], 1e-9)
+            << k;
+        EXPECT_NEAR(fromProduct.latitudes[k], fromImage.latitudes[k], 1e-9)
+            << k;
     }
 }

@@ -37,6 +37,12 @@ void AddBands(ZirOdi2CalibImage &model, const std::vector<int32_t> &codes) {
         model.AddBand(code, "image.tif");
 }
 
+using Factory = std::function<std::unique_ptr<ZirOdi2CalibImage>()>;
+
+template <class Variant> Factory Of() {
+    return [] { return std::make_unique<Variant>(); };
+}
+
 std::optional<std::string> FileEntry(ZirOdi2CalibImage &model,
                                      const char *key) {
     StringListKeeper list;
@@ -56,14 +62,6 @@ TEST(MetadataLists, name_tables) {
         {kHH, "HH"}, {kVH, "VH"}, {kHV, "HV"}, {kVV, "VV"}, {4, "Unknown"}};
     for (const auto &[code, name] : polarizations)
         EXPECT_STREQ(PolarizationName(code), name) << code;
-    const std::pair<const char *, const char *> shortNames[] = {
-        {"Beta Nought", "Beta0"}, {"sigma nought", "Sigma0"},
-        {"GAMMA", "Gamma"},       {"None", "None"},
-        {"Sigma", nullptr},       {nullptr, nullptr}};
-    for (const auto &[type, shortName] : shortNames) {
-        HostText text(CalibrationShortName(type));
-        EXPECT_STREQ(text.get(), shortName) << (type ? type : "(null)");
-    }
 }
 
 TEST(MetadataLists, file_metadata_extends_the_callers_list_in_order) {
@@ -80,23 +78,15 @@ TEST(MetadataLists, file_metadata_extends_the_callers_list_in_order) {
 
     StringListKeeper list(AddStringToList(nullptr, "Caller: kept"));
     list.Reset(model.FileMetadata(list.Release()));
-    const std::vector<std::string> expected = {"Caller: kept",
-                                               "SensorModelName: RADARSAT_2",
-                                               "SensorType: SAR",
-                                               "SensorCode: SAR",
-                                               "ProductType: SLC",
-                                               "Matrix_Type: s4c",
-                                               "SAR_Calibration: Sigma0",
-                                               "RadarBand: C",
-                                               "Polarizations: HH, HV, VH, VV",
-                                               "NumRangeLooks: 4",
-                                               "NumAzimuthLooks: 1",
-                                               "NumLooks: 4",
-                                               "BeamMode: FQ1",
-                                               "RowCount: 30",
-                                               "DefaultRed: 1",
-                                               "DefaultGreen: 2",
-                                               "DefaultBlue: 4"};
+    // clang-format off
+    const std::vector<std::string> expected = {
+        "Caller: kept", "SensorModelName: RADARSAT_2", "SensorType: SAR",
+        "SensorCode: SAR", "ProductType: SLC", "Matrix_Type: s4c",
+        "SAR_Calibration: Sigma0", "RadarBand: C", "Polarizations: HH, HV, VH, VV",
+        "NumRangeLooks: 4", "NumAzimuthLooks: 1", "NumLooks: 4",
+        "BeamMode: FQ1", "RowCount: 30",
+        "DefaultRed: 1", "DefaultGreen: 2", "DefaultBlue: 4"};
+    // clang-format on
     EXPECT_EQ(Texts(list.Get()), expected);
     // The model keeps its own list.
     EXPECT_EQ(Texts(model.GetMetadata()),
@@ -104,51 +94,31 @@ TEST(MetadataLists, file_metadata_extends_the_callers_list_in_order) {
 }
 
 TEST(MetadataLists, default_display_channels_need_a_quad_or_co_and_cross_pair) {
-    using Factory = std::function<std::unique_ptr<ZirOdi2CalibImage>()>;
     struct Case {
         const char *comment;
         Factory make;
         std::vector<int32_t> bands;
         std::vector<std::string> defaults; // red, green, blue; empty: none
     };
+    // clang-format off
     const Case cases[] = {
-        {"quad SLC",
-         [] { return std::make_unique<ZirOdi2SLCS4C>(); },
-         {kHH, kVH, kHV, kVV},
-         {"1", "2", "4"}},
-        {"quad geocoded, whatever its bands",
-         [] { return std::make_unique<RUZ2GeocC4R>(); },
-         {},
-         {"1", "2", "4"}},
-        {"dual HH and HV",
-         [] { return std::make_unique<RUZ2GrpC2R>(); },
-         {kHH, kHV},
-         {"1", "2", "1"}},
-        {"dual VV and VH",
-         [] { return std::make_unique<ZirOdi2SLCS2C>(); },
-         {kVV, kVH},
-         {"1", "2", "1"}},
-        {"dual HH and VV",
-         [] { return std::make_unique<RUZ2GrpC2R>(); },
-         {kHH, kVV},
-         {}},
-        {"dual with one image",
-         [] { return std::make_unique<RUZ2GeocC2R>(); },
-         {kHV},
-         {}},
-        {"single", [] { return std::make_unique<RUZ2GrpcCR>(); }, {kHH}, {}},
+        {"quad SLC", Of<ZirOdi2SLCS4C>(), {kHH, kVH, kHV, kVV}, {"1", "2", "4"}},
+        {"quad geocoded, whatever its bands", Of<RUZ2GeocC4R>(), {}, {"1", "2", "4"}},
+        {"dual HH and HV", Of<RUZ2GrpC2R>(), {kHH, kHV}, {"1", "2", "1"}},
+        {"dual VV and VH", Of<ZirOdi2SLCS2C>(), {kVV, kVH}, {"1", "2", "1"}},
+        {"dual HH and VV", Of<RUZ2GrpC2R>(), {kHH, kVV}, {}},
+        {"dual with one image", Of<RUZ2GeocC2R>(), {kHV}, {}},
+        {"single", Of<RUZ2GrpcCR>(), {kHH}, {}},
     };
+    // clang-format on
     for (const Case &c : cases) {
         SCOPED_TRACE(c.comment);
         std::unique_ptr<ZirOdi2CalibImage> model = c.make();
         AddBands(*model, c.bands);
-        StringListKeeper list;
-        list.Reset(model->FileMetadata(list.Release()));
         std::vector<std::string> defaults;
-        for (const char *key : {"DefaultRed", "DefaultGreen", "DefaultBlue"}) {
-            if (std::optional<std::string> value = Entry(list.Get(), key))
+        for (const char *key : {"DefaultRed", "DefaultGreen", "DefaultBlue"})
+            if (std::optional<std::string> value = FileEntry(*model, key))
                 defaults.push_back(*value);
-        }
         EXPECT_EQ(defaults, c.defaults);
     }
 }
@@ -203,32 +173,34 @@ TEST(MetadataLists, look_count_needs_two_positive_numbers) {
 }
 
 TEST(MetadataLists, channel_metadata_describes_a_defined_channel) {
-    RUZ2GrpcCR model;
-    AddBands(model, {kHV});
-    StringListKeeper list;
-    list.Reset(model.ChannelMetadata(1, list.Release()));
-    EXPECT_EQ(Texts(list.Get()),
-              (std::vector<std::string>{"Matrix_Element: _2_2", "Scale: linear",
-                                        "Polarization: HV"}));
-
-    // A channel number without a record leaves the list as it was.
-    char **before = list.Get();
-    list.Reset(model.ChannelMetadata(2, list.Release()));
-    EXPECT_EQ(list.Get(), before);
-    EXPECT_EQ(Texts(list.Get()).size(), 3u);
-}
-
-TEST(MetadataLists, channel_without_an_image_has_no_polarization_entry) {
-    RUZ2GrpC2R model; // HH and VH: channel 1 is VV, which has no image
-    AddBands(model, {kHH, kVH});
-    StringListKeeper list;
-    list.Reset(model.ChannelMetadata(1, list.Release()));
-    EXPECT_EQ(Texts(list.Get()), (std::vector<std::string>{
-                                     "Matrix_Element: _4_4", "Scale: linear"}));
+    struct Case {
+        const char *comment;
+        Factory make;
+        std::vector<int32_t> bands;
+        int32_t channel;
+        std::vector<std::string> entries; // after "Caller: kept"
+    };
+    // clang-format off
+    const Case cases[] = {
+        {"detected HV", Of<RUZ2GrpcCR>(), {kHV}, 1, {"Matrix_Element: _2_2", "Scale: linear", "Polarization: HV"}},
+        // HH and VH: channel 1 is VV, which has no image.
+        {"channel without an image", Of<RUZ2GrpC2R>(), {kHH, kVH}, 1, {"Matrix_Element: _4_4", "Scale: linear"}},
+        {"channel without a record", Of<RUZ2GrpcCR>(), {kHV}, 2, {}},
+    };
+    // clang-format on
+    for (const Case &c : cases) {
+        SCOPED_TRACE(c.comment);
+        std::unique_ptr<ZirOdi2CalibImage> model = c.make();
+        AddBands(*model, c.bands);
+        StringListKeeper list(AddStringToList(nullptr, "Caller: kept"));
+        list.Reset(model->ChannelMetadata(c.channel, list.Release()));
+        std::vector<std::string> expected = {"Caller: kept"};
+        expected.insert(expected.end(), c.entries.begin(), c.entries.end());
+        EXPECT_EQ(Texts(list.Get()), expected);
+    }
 }
 
 TEST(MetadataLists, channel_descriptions) {
-    using Factory = std::function<std::unique_ptr<ZirOdi2CalibImage>()>;
     struct Case {
         const char *comment;
         Factory make;
@@ -237,44 +209,18 @@ TEST(MetadataLists, channel_descriptions) {
         int32_t channel;
         const char *expected;
     };
-    auto detected = [] { return std::make_unique<RUZ2GrpcCR>(); };
-    auto slc = [] { return std::make_unique<ZirOdi2SLC>(); };
-    auto dual = [] { return std::make_unique<RUZ2GrpC2R>(); };
+    // clang-format off
     const Case cases[] = {
-        {"detected", detected, {kHV}, "None", 1, "HV detected data"},
-        {"complex, calibrated",
-         slc,
-         {kVV},
-         "Beta Nought",
-         1,
-         "VV Beta Nought Complex"},
-        {"complex, uncalibrated",
-         slc,
-         {kVV},
-         "None",
-         1,
-         "VV Uncalibrated Complex"},
-        {"complex, none in another case",
-         slc,
-         {kVV},
-         "NONE",
-         1,
-         "VV Uncalibrated Complex"},
-        {"complex, calibration unset",
-         slc,
-         {kVV},
-         nullptr,
-         1,
-         "VV Uncalibrated Complex"},
-        {"channel without an image", dual, {kHH, kVH}, "None", 1, ""},
-        {"its partner with one",
-         dual,
-         {kHH, kVH},
-         "None",
-         2,
-         "VH detected data"},
-        {"channel without a record", detected, {kHH}, "None", 5, ""},
+        {"detected", Of<RUZ2GrpcCR>(), {kHV}, "None", 1, "HV detected data"},
+        {"complex, calibrated", Of<ZirOdi2SLC>(), {kVV}, "Beta Nought", 1, "VV Beta Nought Complex"},
+        {"complex, uncalibrated", Of<ZirOdi2SLC>(), {kVV}, "None", 1, "VV Uncalibrated Complex"},
+        {"complex, none in another case", Of<ZirOdi2SLC>(), {kVV}, "NONE", 1, "VV Uncalibrated Complex"},
+        {"complex, calibration unset", Of<ZirOdi2SLC>(), {kVV}, nullptr, 1, "VV Uncalibrated Complex"},
+        {"channel without an image", Of<RUZ2GrpC2R>(), {kHH, kVH}, "None", 1, ""},
+        {"its partner with one", Of<RUZ2GrpC2R>(), {kHH, kVH}, "None", 2, "VH detected data"},
+        {"channel without a record", Of<RUZ2GrpcCR>(), {kHH}, "None", 5, ""},
     };
+    // clang-format on
     for (const Case &c : cases) {
         SCOPED_TRACE(c.comment);
         std::unique_ptr<ZirOdi2CalibImage> model = c.make();
@@ -284,14 +230,6 @@ TEST(MetadataLists, channel_descriptions) {
         model->ChannelCount(); // open defines the channels first
         EXPECT_STREQ(model->ChannelDescription(c.channel), c.expected);
     }
-}
-
-TEST(MetadataLists, product_type_entry_names_the_type) {
-    RUZ2GrpcCR model;
-    model.SetProductType(static_cast<int32_t>(ProductType::SCW));
-    EXPECT_STREQ(model.ProductTypeEntry(), "ProductType: SCW");
-    model.SetProductType(static_cast<int32_t>(ProductType::Unknown));
-    EXPECT_STREQ(model.ProductTypeEntry(), "ProductType: UNKNOWN");
 }
 
 TEST(MetadataLists, incidence_angle_entry_is_appended) {

@@ -225,12 +225,42 @@ TEST(RpcBinarySegment, ties_the_model_to_longitude_latitude_without_an_image) {
     }
 }
 
-TEST(RpcBinaryLength, reports_the_image_files_segment_even_with_a_model) {
-    LoadedProduct loaded(rs2gen::ProductOptions{});
-    ASSERT_NE(loaded.model, nullptr);
-    ASSERT_NE(loaded.reader.rationalFunctions, nullptr);
-    // The generated image carries no RPC model of its own.
-    EXPECT_EQ(loaded.model->RpcBinaryLength(),
-              BinaryLengthOf(loaded.product.imageFiles[0]));
-    EXPECT_EQ(loaded.model->RpcBinaryLength(), 0);
+TEST(RpcBinaryLength, is_the_length_of_what_a_read_serves) {
+    enum class Image { Plain, WithRpc };
+    struct Case {
+        const char *what;
+        bool model;
+        Image image;
+        int32_t length; // -1: the image file's own segment length
+    } cases[] = {
+        {"the model's block, the image having none", true, Image::Plain,
+         kRFBlockSize},
+        {"the model's block, not the image's", true, Image::WithRpc,
+         kRFBlockSize},
+        {"the image file's empty segment", false, Image::Plain, 0},
+        {"the image file's segment", false, Image::WithRpc, -1},
+    };
+    for (const Case &c : cases) {
+        SCOPED_TRACE(c.what);
+        rs2gen::ProductOptions options;
+        options.rationalFunctions = c.model;
+        LoadedProduct loaded(options, [&](const rs2gen::GeneratedProduct &p) {
+            if (c.image == Image::WithRpc)
+                ReplaceImage(p, options, ImageWithRpc());
+        });
+        ASSERT_NE(loaded.model, nullptr);
+        ASSERT_EQ(loaded.reader.rationalFunctions != nullptr, c.model);
+        const int32_t imageLength =
+            BinaryLengthOf(loaded.product.imageFiles[0]);
+        ASSERT_EQ(imageLength > 0, c.image == Image::WithRpc);
+        const int32_t expected = c.length >= 0 ? c.length : imageLength;
+        EXPECT_EQ(loaded.model->RpcBinaryLength(), expected);
+        // A whole read of the reported length gives the segment: with a
+        // model its block decodes.
+        if (c.model) {
+            EXPECT_NE(Decode(Request(*loaded.model, 0, expected,
+                                     static_cast<size_t>(expected))),
+                      nullptr);
+        }
+    }
 }

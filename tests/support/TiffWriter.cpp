@@ -182,45 +182,36 @@ class BlockFiller {
     uint32_t pixelElements = 0;
 };
 
-void WriteStrips(TIFF *tif, const TiffSpec &spec, const ElementValue &value) {
+// Writes every strip or tile in libtiff's numbering: plane by plane, row
+// by row. A strip is a block as wide as the image; tiles are whole at the
+// image edges, while the last strip holds only the lines left.
+void WriteBlocks(TIFF *tif, const TiffSpec &spec, const ElementValue &value) {
     const BlockFiller filler(spec);
+    const bool tiled = spec.tileSize > 0;
+    const uint32_t blockWidth = tiled ? spec.tileSize : spec.width;
+    const uint32_t blockLines = tiled ? spec.tileSize : spec.rowsPerStrip;
     const uint32_t planes =
         spec.planarConfig == PLANARCONFIG_SEPARATE ? spec.samplesPerPixel : 1;
-    const uint32_t perPlane =
-        (spec.height + spec.rowsPerStrip - 1) / spec.rowsPerStrip;
-    for (uint32_t plane = 0; plane < planes; ++plane)
-        for (uint32_t s = 0; s < perPlane; ++s) {
-            const uint32_t y0 = s * spec.rowsPerStrip;
-            const uint32_t lines =
-                std::min(spec.rowsPerStrip, spec.height - y0);
-            const auto size = static_cast<size_t>(TIFFVStripSize(tif, lines));
-            std::vector<unsigned char> bytes =
-                filler.Fill({plane, 0, y0, spec.width, lines}, size, value);
-            if (TIFFWriteEncodedStrip(tif, plane * perPlane + s, bytes.data(),
-                                      static_cast<tmsize_t>(size)) < 0)
-                throw std::runtime_error("cannot write a strip");
-        }
-}
-
-void WriteTiles(TIFF *tif, const TiffSpec &spec, const ElementValue &value) {
-    const BlockFiller filler(spec);
-    const uint32_t planes =
-        spec.planarConfig == PLANARCONFIG_SEPARATE ? spec.samplesPerPixel : 1;
-    const uint32_t size = spec.tileSize;
-    const uint32_t across = (spec.width + size - 1) / size;
-    const uint32_t down = (spec.height + size - 1) / size;
-    const auto bytesPerTile = static_cast<size_t>(TIFFTileSize(tif));
+    const uint32_t across = (spec.width + blockWidth - 1) / blockWidth;
+    const uint32_t down = (spec.height + blockLines - 1) / blockLines;
+    uint32_t index = 0;
     for (uint32_t plane = 0; plane < planes; ++plane)
         for (uint32_t row = 0; row < down; ++row)
-            for (uint32_t column = 0; column < across; ++column) {
-                std::vector<unsigned char> bytes =
-                    filler.Fill({plane, column * size, row * size, size, size},
-                                bytesPerTile, value);
-                const uint32_t index = (plane * down + row) * across + column;
-                if (TIFFWriteEncodedTile(tif, index, bytes.data(),
-                                         static_cast<tmsize_t>(bytesPerTile)) <
-                    0)
-                    throw std::runtime_error("cannot write a tile");
+            for (uint32_t column = 0; column < across; ++column, ++index) {
+                const uint32_t y0 = row * blockLines;
+                const uint32_t lines =
+                    tiled ? blockLines : std::min(blockLines, spec.height - y0);
+                const auto size = static_cast<tmsize_t>(
+                    tiled ? TIFFTileSize(tif) : TIFFVStripSize(tif, lines));
+                std::vector<unsigned char> bytes = filler.Fill(
+                    {plane, column * blockWidth, y0, blockWidth, lines},
+                    size_t(size), value);
+                if ((tiled
+                         ? TIFFWriteEncodedTile(tif, index, bytes.data(), size)
+                         : TIFFWriteEncodedStrip(tif, index, bytes.data(),
+                                                 size)) < 0)
+                    throw std::runtime_error("cannot write block " +
+                                             std::to_string(index));
             }
 }
 
@@ -233,10 +224,7 @@ void WriteTiff(const std::string &path, const TiffSpec &spec,
         throw std::runtime_error("cannot create " + path);
     SetLayoutFields(tif.get(), spec);
     SetGeoFields(tif.get(), spec);
-    if (spec.tileSize > 0)
-        WriteTiles(tif.get(), spec, value);
-    else
-        WriteStrips(tif.get(), spec, value);
+    WriteBlocks(tif.get(), spec, value);
 }
 
 std::vector<std::pair<uint64_t, uint64_t>>

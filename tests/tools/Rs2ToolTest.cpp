@@ -72,7 +72,7 @@ TEST_F(ToolOnProduct, info_json_keeps_its_contract) {
     EXPECT_EQ(info["projection"]["code"], 2); // UTM
     EXPECT_FALSE(info["orbit"].is_null());
     EXPECT_FALSE(info["rpc"].is_null());
-    EXPECT_NE(info["name"].get<std::string>().find("c=Sigma"),
+    EXPECT_NE(info["name"].get<std::string>().find("c=sigma"),
               std::string::npos);
 }
 

@@ -7,6 +7,7 @@
 
 void AddInfoCommand(CLI::App &app);
 void AddReadCommand(CLI::App &app);
+void AddExportCommand(CLI::App &app);
 void AddTextCommands(CLI::App &app);
 void AddDriverCommand(CLI::App &app);
 void AddSampleCommand(CLI::App &app);

@@ -12,6 +12,7 @@ int main(int argc, char **argv) {
     app.require_subcommand(1);
     AddInfoCommand(app);
     AddReadCommand(app);
+    AddExportCommand(app);
     AddTextCommands(app);
     AddDriverCommand(app);
     AddSampleCommand(app);

@@ -1,0 +1,101 @@
+#pragma once
+
+#include "host/Visibility.hpp"
+
+#include "host/GeoTiffImage.hpp"
+
+#include <array>
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace host {
+
+/// Error code of a GeoTIFF that cannot be created or written.
+constexpr int32_t kErrWriteFailed = 6;
+
+/// What one channel of a written pixel holds.
+enum class SampleType {
+    Float32,        ///< one IEEE float
+    ComplexFloat32, ///< in-phase and quadrature floats, one 64-bit sample
+    Int32,          ///< one signed 32-bit integer
+    /// in-phase and quadrature as two signed 16-bit samples, so a channel
+    /// takes two samples of the pixel
+    ComplexInt16,
+};
+
+/// Where a written image lies on the ground. The raster positions follow
+/// the host's pixel-is-area convention (see ProjInfo_t): the file says
+/// RasterPixelIsArea and takes transform and tie points as they are.
+struct GeoTiffGeoreferencing {
+    /// The model system of transform and tie points: "LONG D000" (WGS 84
+    /// geographic, x longitude, y latitude) or "UTM zz B D000" (WGS 84 /
+    /// UTM zone zz, north for bands N..X, south for C..M). Empty: the file
+    /// gets no georeferencing.
+    std::string geosys;
+    bool hasTransform = false;
+    /// GDAL order (upper-left x, x per column, x per line, upper-left y,
+    /// y per column, y per line), used when hasTransform is set.
+    std::array<double, 6> transform{};
+    /// Ground control points in geosys. Without a transform they are the
+    /// georeferencing; with one they travel beside it in the same system.
+    std::vector<TiePoint> tiePoints;
+};
+
+/// A new stripped, uncompressed GeoTIFF written row band by row band, so a
+/// large image never has to be held in memory. It owns its libtiff and
+/// libgeotiff handles; libtiff's messages go to a per-file handler and become
+/// the reason of the failure they belong to, never printed. The file is a
+/// BigTIFF when a classic TIFF could not address it. Pixels are
+/// pixel-interleaved in native byte order.
+///
+/// A writer that fails, or is destroyed without a successful Close(), closes
+/// its file as it stands: an unfinished image, which the caller removes.
+class VXB_API GeoTiffWriter {
+  public:
+    /// Creates path (replacing a file there) for an image of width x height
+    /// pixels of channels channels. Throws std::invalid_argument for sizes
+    /// below 1 or a row too long to address, host::Error(kErrWriteFailed)
+    /// naming the file when it cannot be created.
+    GeoTiffWriter(const std::string &path, int32_t width, int32_t height,
+                  int32_t channels, SampleType type);
+    ~GeoTiffWriter();
+    GeoTiffWriter(const GeoTiffWriter &) = delete;
+    GeoTiffWriter &operator=(const GeoTiffWriter &) = delete;
+
+    /// Bytes of one row of pixels, as WriteRows expects them.
+    size_t RowBytes() const;
+    /// Rows per strip of the file; bands of a multiple of it are written
+    /// without being copied.
+    int32_t RowsPerStrip() const;
+    /// True when the file is a BigTIFF.
+    bool IsBigTiff() const;
+
+    /// Sets the georeferencing tags and keys, once, before the first row
+    /// (else std::logic_error); an empty geosys sets nothing. Throws
+    /// std::invalid_argument for an unknown system, a non-finite or singular
+    /// transform, non-finite or too many tie points, or neither transform
+    /// nor tie points.
+    void SetGeoreferencing(const GeoTiffGeoreferencing &georeferencing);
+
+    /// Writes rowCount rows starting at firstRow from data (rowCount x
+    /// RowBytes() bytes). Rows come in order: firstRow is the first row not
+    /// yet written, else std::invalid_argument. Throws host::Error
+    /// (kErrWriteFailed) with libtiff's reason when the file cannot be
+    /// written; the writer is unusable afterwards.
+    void WriteRows(int32_t firstRow, int32_t rowCount, const void *data);
+
+    /// Writes the directory and closes the file. Throws
+    /// host::Error(kErrWriteFailed) when rows are missing or the file cannot
+    /// be finished or closed; the file is unfinished then. Closing twice is
+    /// a std::logic_error.
+    void Close();
+
+  private:
+    struct State;
+    std::unique_ptr<State> state;
+};
+
+} // namespace host

@@ -1,0 +1,349 @@
+#include "host/GeoTiffWriter.hpp"
+#include "host/Raster.hpp"
+#include "tests/support/TempDir.hpp"
+
+#include <geotiffio.h>
+#include <geovalues.h>
+#include <gtest/gtest.h>
+#include <tiffio.h>
+#include <xtiffio.h>
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+#include <cstdio>
+#include <cstring>
+#include <fstream>
+#include <memory>
+#include <signal.h>
+#include <sys/resource.h>
+#include <unistd.h>
+#include <vector>
+
+namespace {
+
+struct TiffCloser {
+    void operator()(TIFF *tiff) const { XTIFFClose(tiff); }
+};
+using TiffKeeper = std::unique_ptr<TIFF, TiffCloser>;
+struct GtifDeleter {
+    void operator()(GTIF *gtif) const { GTIFFree(gtif); }
+};
+using GtifKeeper = std::unique_ptr<GTIF, GtifDeleter>;
+
+TiffKeeper OpenForReading(const std::string &path) {
+    return TiffKeeper(XTIFFOpen(path.c_str(), "r"));
+}
+
+template <typename T> T Field(TIFF *tiff, ttag_t tag) {
+    T value{};
+    TIFFGetFieldDefaulted(tiff, tag, &value);
+    return value;
+}
+
+std::vector<double> DoubleArray(TIFF *tiff, ttag_t tag) {
+    uint16_t count = 0;
+    double *values = nullptr;
+    if (TIFFGetField(tiff, tag, &count, &values) != 1)
+        return {};
+    return std::vector<double>(values, values + count);
+}
+
+int ShortKey(GTIF *gtif, geokey_t key) {
+    unsigned short value = 0;
+    return GTIFKeyGetSHORT(gtif, key, &value, 0, 1) == 1 ? value : -1;
+}
+
+// Bytes 2-3 of a little-endian TIFF header: 42 classic, 43 BigTIFF.
+int TiffVersion(const std::string &path) {
+    std::ifstream file(path, std::ios::binary);
+    unsigned char header[4] = {};
+    file.read(reinterpret_cast<char *>(header), sizeof header);
+    return header[2] | header[3] << 8;
+}
+
+// Deterministic, distinct bytes for every position of the image.
+std::vector<unsigned char> Pattern(size_t bytes) {
+    std::vector<unsigned char> data(bytes);
+    for (size_t i = 0; i < bytes; ++i)
+        data[i] = static_cast<unsigned char>(((i * 7919u) >> 3) ^ i);
+    return data;
+}
+
+std::vector<unsigned char> ReadAllRows(TIFF *tiff, size_t rowBytes,
+                                       uint32_t height) {
+    std::vector<unsigned char> data(rowBytes * height);
+    for (uint32_t row = 0; row < height; ++row)
+        if (TIFFReadScanline(tiff, data.data() + rowBytes * row, row, 0) != 1)
+            return {};
+    return data;
+}
+
+} // namespace
+
+TEST(GeoTiffWriter, sample_types_have_their_tiff_layout_and_round_trip) {
+    struct Case {
+        host::SampleType type;
+        int32_t channels;
+        uint16_t bits, format, samples;
+        size_t pixelBytes;
+    };
+    const Case cases[] = {
+        {host::SampleType::Float32, 1, 32, SAMPLEFORMAT_IEEEFP, 1, 4},
+        {host::SampleType::Float32, 3, 32, SAMPLEFORMAT_IEEEFP, 3, 12},
+        {host::SampleType::ComplexFloat32, 2, 64, SAMPLEFORMAT_COMPLEXIEEEFP, 2,
+         16},
+        {host::SampleType::Int32, 2, 32, SAMPLEFORMAT_INT, 2, 8},
+        {host::SampleType::ComplexInt16, 2, 16, SAMPLEFORMAT_INT, 4, 8},
+    };
+    rs2test::TempDir folder;
+    // Strips of 5 to 21 rows for these pixel sizes, the last one short.
+    const int32_t width = 3001;
+    const int32_t height = 23;
+    for (const Case &c : cases) {
+        const std::string path = folder.File("layout.tif");
+        const std::vector<unsigned char> data =
+            Pattern(c.pixelBytes * width * height);
+        int32_t stripRows = 0;
+        {
+            host::GeoTiffWriter writer(path, width, height, c.channels, c.type);
+            ASSERT_EQ(writer.RowBytes(), c.pixelBytes * width);
+            stripRows = writer.RowsPerStrip();
+            // Bands that start and end inside strips, then whole strips.
+            int32_t row = 0;
+            for (int32_t rows : {1, stripRows + 1, 2 * stripRows, height}) {
+                rows = std::min(rows, height - row);
+                writer.WriteRows(row, rows,
+                                 data.data() + writer.RowBytes() * row);
+                row += rows;
+            }
+            writer.Close();
+        }
+        TiffKeeper tiff = OpenForReading(path);
+        ASSERT_TRUE(tiff) << c.bits;
+        EXPECT_EQ(Field<uint16_t>(tiff.get(), TIFFTAG_BITSPERSAMPLE), c.bits);
+        EXPECT_EQ(Field<uint16_t>(tiff.get(), TIFFTAG_SAMPLEFORMAT), c.format);
+        EXPECT_EQ(Field<uint16_t>(tiff.get(), TIFFTAG_SAMPLESPERPIXEL),
+                  c.samples);
+        EXPECT_EQ(Field<uint32_t>(tiff.get(), TIFFTAG_ROWSPERSTRIP),
+                  static_cast<uint32_t>(stripRows));
+        EXPECT_GT(stripRows, 1);
+        EXPECT_LT(stripRows, height);
+        EXPECT_EQ(ReadAllRows(tiff.get(), c.pixelBytes * width, height), data)
+            << c.bits << " bits, " << c.channels << " channel(s)";
+        EXPECT_EQ(TiffVersion(path), 42);
+    }
+}
+
+TEST(GeoTiffWriter, rows_must_come_in_order_and_all_of_them) {
+    rs2test::TempDir folder;
+    const std::vector<unsigned char> row(4 * 10);
+    host::GeoTiffWriter writer(folder.File("order.tif"), 10, 5, 1,
+                               host::SampleType::Float32);
+    writer.WriteRows(0, 1, row.data());
+    EXPECT_THROW(writer.WriteRows(0, 1, row.data()), std::invalid_argument);
+    EXPECT_THROW(writer.WriteRows(2, 1, row.data()), std::invalid_argument);
+    EXPECT_THROW(writer.WriteRows(1, 5, row.data()), std::invalid_argument);
+    writer.WriteRows(1, 1, row.data());
+    try {
+        writer.Close();
+        ADD_FAILURE() << "closing after 2 of 5 rows succeeded";
+    } catch (const host::Error &error) {
+        EXPECT_EQ(error.Code(), host::kErrWriteFailed);
+        EXPECT_NE(std::string(error.what()).find("2 of 5 rows"),
+                  std::string::npos)
+            << error.what();
+    }
+    EXPECT_THROW(writer.Close(), std::logic_error); // closed by the failure
+}
+
+TEST(GeoTiffWriter, refuses_what_it_cannot_create) {
+    rs2test::TempDir folder;
+    const std::string missing = folder.File("no/such/folder/out.tif");
+    try {
+        host::GeoTiffWriter writer(missing, 4, 4, 1, host::SampleType::Int32);
+        ADD_FAILURE() << "created " << missing;
+    } catch (const host::Error &error) {
+        EXPECT_EQ(error.Code(), host::kErrWriteFailed);
+        EXPECT_EQ(std::string(error.what()).rfind(missing, 0), 0u)
+            << error.what();
+    }
+    const std::pair<int32_t, int32_t> badSizes[] = {{0, 4}, {4, 0}, {-1, 4}};
+    for (const auto &[width, height] : badSizes)
+        EXPECT_THROW(host::GeoTiffWriter(folder.File("bad.tif"), width, height,
+                                         1, host::SampleType::Int32),
+                     std::invalid_argument)
+            << width << " x " << height;
+}
+
+namespace {
+
+// Runs in a child process: files may grow to 64 KiB, and the signal that
+// would end the process at that limit is ignored, so writes fail. Exits 0
+// when the writer reports the failure as a write failure.
+[[noreturn]] void WriteBeyondFileSizeLimit(const std::string &path) {
+    const rlimit limit{64 << 10, 64 << 10};
+    setrlimit(RLIMIT_FSIZE, &limit);
+    signal(SIGXFSZ, SIG_IGN);
+    const std::vector<unsigned char> rows(512 * 4 * 512);
+    try {
+        host::GeoTiffWriter writer(path, 512, 512, 1,
+                                   host::SampleType::Float32);
+        writer.WriteRows(0, 512, rows.data());
+        writer.Close();
+    } catch (const host::Error &error) {
+        std::fprintf(stderr, "%s\n", error.what());
+        _exit(error.Code() == host::kErrWriteFailed ? 0 : 2);
+    }
+    _exit(1);
+}
+
+} // namespace
+
+TEST(GeoTiffWriter, a_failing_disk_is_reported_not_ignored) {
+    rs2test::TempDir folder;
+    EXPECT_EXIT(WriteBeyondFileSizeLimit(folder.File("full.tif")),
+                ::testing::ExitedWithCode(0), "full.tif");
+}
+
+TEST(GeoTiffWriter, becomes_a_bigtiff_only_beyond_4_gib) {
+    struct Case {
+        int32_t width, height;
+        bool big;
+    };
+    // 8 bytes a pixel. A classic TIFF keeps 64 MiB of its 4 GiB for tags:
+    // 16384 x 32255 pixels fit beside them, one more row does not.
+    const Case cases[] = {
+        {1000, 1000, false}, {16384, 32255, false}, {16384, 32256, true}};
+    rs2test::TempDir folder;
+    for (const Case &c : cases) {
+        const std::string path = folder.File("big.tif");
+        {
+            host::GeoTiffWriter writer(path, c.width, c.height, 1,
+                                       host::SampleType::ComplexFloat32);
+            EXPECT_EQ(writer.IsBigTiff(), c.big) << c.width << "x" << c.height;
+        } // closed unfinished, without a row
+        EXPECT_EQ(TiffVersion(path), c.big ? 43 : 42);
+    }
+}
+
+namespace {
+
+struct WrittenGeoreferencing {
+    int modelType, rasterType, projected, geographic;
+    std::vector<double> matrix, scale, ties;
+};
+
+WrittenGeoreferencing WriteAndReadBack(const std::string &path,
+                                       const host::GeoTiffGeoreferencing &geo) {
+    {
+        host::GeoTiffWriter writer(path, 4, 3, 1, host::SampleType::Float32);
+        writer.SetGeoreferencing(geo);
+        const std::vector<float> rows(12, 1.0f);
+        writer.WriteRows(0, 3, rows.data());
+        writer.Close();
+    }
+    TiffKeeper tiff = OpenForReading(path);
+    GtifKeeper gtif(tiff ? GTIFNew(tiff.get()) : nullptr);
+    if (!gtif)
+        return {};
+    return {ShortKey(gtif.get(), GTModelTypeGeoKey),
+            ShortKey(gtif.get(), GTRasterTypeGeoKey),
+            ShortKey(gtif.get(), ProjectedCSTypeGeoKey),
+            ShortKey(gtif.get(), GeographicTypeGeoKey),
+            DoubleArray(tiff.get(), TIFFTAG_GEOTRANSMATRIX),
+            DoubleArray(tiff.get(), TIFFTAG_GEOPIXELSCALE),
+            DoubleArray(tiff.get(), TIFFTAG_GEOTIEPOINTS)};
+}
+
+} // namespace
+
+TEST(GeoTiffWriter, writes_utm_and_geographic_georeferencing_as_pixel_is_area) {
+    const std::array<double, 6> rotated = {500000.0,  11.5, -2.0,
+                                           5450000.0, -1.5, -12.5};
+    const std::array<double, 6> northUp = {300000.0,  10.0, 0.0,
+                                           7000000.0, 0.0,  -10.0};
+    const host::TiePoint tie{0.5, 0.5, -123.25, 49.5, 12.0};
+    struct Case {
+        host::GeoTiffGeoreferencing geo;
+        int modelType, projected, geographic;
+        std::vector<double> matrix, scale, ties;
+    };
+    const Case cases[] = {
+        // A rotated grid needs the matrix; its tie points follow it.
+        {{"UTM 10 U D000",
+          true,
+          rotated,
+          {{0.5, 0.5, 500010.0, 5449990.0, 3.0}}},
+         ModelTypeProjected,
+         32610,
+         -1,
+         {11.5, -2.0, 0, 500000.0, -1.5, -12.5, 0, 5450000.0, 0, 0, 0, 0, 0, 0,
+          0, 1},
+         {},
+         {0.5, 0.5, 0, 500010.0, 5449990.0, 3.0}},
+        // A north-up grid in the south: scale and one tie point.
+        {{"UTM 33 H D000", true, northUp, {}},
+         ModelTypeProjected,
+         32733,
+         -1,
+         {},
+         {10.0, 10.0, 0.0},
+         {0, 0, 0, 300000.0, 7000000.0, 0}},
+        // Tie points alone, in WGS 84 longitude and latitude.
+        {{"LONG D000", false, {}, {tie}},
+         ModelTypeGeographic,
+         -1,
+         GCS_WGS_84,
+         {},
+         {},
+         {0.5, 0.5, 0, -123.25, 49.5, 12.0}},
+    };
+    rs2test::TempDir folder;
+    for (const Case &c : cases) {
+        const WrittenGeoreferencing written =
+            WriteAndReadBack(folder.File("geo.tif"), c.geo);
+        EXPECT_EQ(written.modelType, c.modelType) << c.geo.geosys;
+        EXPECT_EQ(written.rasterType, RasterPixelIsArea) << c.geo.geosys;
+        EXPECT_EQ(written.projected, c.projected) << c.geo.geosys;
+        EXPECT_EQ(written.geographic, c.geographic) << c.geo.geosys;
+        EXPECT_EQ(written.matrix, c.matrix) << c.geo.geosys;
+        EXPECT_EQ(written.scale, c.scale) << c.geo.geosys;
+        EXPECT_EQ(written.ties, c.ties) << c.geo.geosys;
+    }
+}
+
+TEST(GeoTiffWriter, the_host_reader_reads_back_what_it_wrote) {
+    rs2test::TempDir folder;
+    const std::string path = folder.File("loop.tif");
+    host::GeoTiffGeoreferencing geo{
+        "UTM 10 U D000",
+        true,
+        {500000.0, 11.5, -2.0, 5450000.0, -1.5, -12.5},
+        {}};
+    WriteAndReadBack(path, geo);
+    host::Raster raster = host::OpenRaster(path);
+    const ProjInfo_t projection = raster.Projection();
+    EXPECT_STREQ(projection.geosys, "UTM 10 U D000");
+    for (int i = 0; i < 6; ++i)
+        EXPECT_NEAR(projection.transform[i], geo.transform[i], 1e-9) << i;
+}
+
+TEST(GeoTiffWriter, refuses_georeferencing_it_cannot_state) {
+    const double nan = std::nan("");
+    const host::GeoTiffGeoreferencing cases[] = {
+        {"PIXEL", true, {0, 1, 0, 0, 0, -1}, {}},        // no ground system
+        {"METER", true, {0, 1, 0, 0, 0, -1}, {}},        // no known datum
+        {"UTM 10 U D000", true, {0, 1, 2, 0, 2, 4}, {}}, // singular
+        {"UTM 10 U D000", true, {nan, 1, 0, 0, 0, -1}, {}},
+        {"LONG D000", false, {}, {{0.5, 0.5, nan, 49.0, 0.0}}},
+        {"LONG D000", false, {}, {}}, // nothing to state
+    };
+    rs2test::TempDir folder;
+    for (const host::GeoTiffGeoreferencing &geo : cases) {
+        host::GeoTiffWriter writer(folder.File("refused.tif"), 2, 2, 1,
+                                   host::SampleType::Float32);
+        EXPECT_THROW(writer.SetGeoreferencing(geo), std::invalid_argument)
+            << geo.geosys;
+    }
+}

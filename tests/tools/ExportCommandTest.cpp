@@ -1,0 +1,560 @@
+#include "host/Raster.hpp"
+#include "tests/support/TempDir.hpp"
+#include "tools/generator/ProductGenerator.hpp"
+
+#include <geotiffio.h>
+#include <geovalues.h>
+#include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
+#include <tiffio.h>
+#include <xtiffio.h>
+
+#include <array>
+#include <cmath>
+#include <cstdio>
+#include <cstring>
+#include <filesystem>
+#include <fstream>
+#include <functional>
+#include <memory>
+#include <sstream>
+#include <string>
+#include <sys/wait.h>
+#include <vector>
+
+namespace {
+
+namespace fs = std::filesystem;
+
+struct CommandResult {
+    int exitCode;
+    std::string output; // standard output
+    std::string errors; // standard error
+};
+
+std::string Quoted(const std::string &text) { return "'" + text + "'"; }
+
+std::string FileText(const std::string &path) {
+    std::ifstream file(path, std::ios::binary);
+    std::ostringstream text;
+    text << file.rdbuf();
+    return text.str();
+}
+
+// The tool, quoted for the shell.
+std::string Rs2() { return Quoted(RS2_TOOL); }
+
+// Runs a shell command line; its standard error goes to a file of a scratch
+// folder of its own (so that output folders hold only what the tool wrote)
+// and is read back.
+CommandResult RunShell(const std::string &line) {
+    static const rs2test::TempDir scratch;
+    const std::string errors = scratch.File("stderr.txt");
+    const std::string command = "{ " + line + "; } 2>" + Quoted(errors);
+    FILE *pipe = popen(command.c_str(), "r");
+    if (pipe == nullptr)
+        return {-1, "", ""};
+    std::string output;
+    std::array<char, 4096> chunk{};
+    size_t read = 0;
+    while ((read = std::fread(chunk.data(), 1, chunk.size(), pipe)) > 0)
+        output.append(chunk.data(), read);
+    const int status = pclose(pipe);
+    return {WIFEXITED(status) ? WEXITSTATUS(status) : -1, output,
+            FileText(errors)};
+}
+
+std::vector<std::string> FolderEntries(const std::string &folder) {
+    std::vector<std::string> names;
+    for (const auto &entry : fs::directory_iterator(folder))
+        names.push_back(entry.path().filename().string());
+    return names;
+}
+
+struct TiffCloser {
+    void operator()(TIFF *tiff) const { XTIFFClose(tiff); }
+};
+using TiffKeeper = std::unique_ptr<TIFF, TiffCloser>;
+struct GtifDeleter {
+    void operator()(GTIF *gtif) const { GTIFFree(gtif); }
+};
+
+// What a GeoTIFF holds, read with libtiff and libgeotiff alone.
+struct TiffContents {
+    uint32_t width = 0, height = 0;
+    uint16_t bits = 0, format = 0, samples = 0;
+    std::vector<unsigned char> pixels;
+    int modelType = -1, rasterType = -1, projected = -1, geographic = -1;
+    std::vector<double> matrix, ties;
+
+    template <typename T> T Sample(size_t index) const {
+        T value;
+        std::memcpy(&value, pixels.data() + index * sizeof(T), sizeof(T));
+        return value;
+    }
+};
+
+std::vector<double> DoubleArray(TIFF *tiff, ttag_t tag) {
+    uint16_t count = 0;
+    double *values = nullptr;
+    if (TIFFGetField(tiff, tag, &count, &values) != 1)
+        return {};
+    return std::vector<double>(values, values + count);
+}
+
+int ShortKey(GTIF *gtif, geokey_t key) {
+    unsigned short value = 0;
+    return GTIFKeyGetSHORT(gtif, key, &value, 0, 1) == 1 ? value : -1;
+}
+
+TiffContents ReadTiff(const std::string &path) {
+    TiffContents contents;
+    TiffKeeper tiff(XTIFFOpen(path.c_str(), "r"));
+    if (!tiff)
+        return contents;
+    TIFF *t = tiff.get();
+    TIFFGetField(t, TIFFTAG_IMAGEWIDTH, &contents.width);
+    TIFFGetField(t, TIFFTAG_IMAGELENGTH, &contents.height);
+    TIFFGetFieldDefaulted(t, TIFFTAG_BITSPERSAMPLE, &contents.bits);
+    TIFFGetFieldDefaulted(t, TIFFTAG_SAMPLEFORMAT, &contents.format);
+    TIFFGetFieldDefaulted(t, TIFFTAG_SAMPLESPERPIXEL, &contents.samples);
+    const auto rowBytes = static_cast<size_t>(TIFFScanlineSize64(t));
+    contents.pixels.resize(rowBytes * contents.height);
+    for (uint32_t row = 0; row < contents.height; ++row)
+        if (TIFFReadScanline(t, contents.pixels.data() + rowBytes * row, row,
+                             0) != 1)
+            return {};
+    contents.matrix = DoubleArray(t, TIFFTAG_GEOTRANSMATRIX);
+    contents.ties = DoubleArray(t, TIFFTAG_GEOTIEPOINTS);
+    std::unique_ptr<GTIF, GtifDeleter> gtif(GTIFNew(t));
+    if (gtif) {
+        contents.modelType = ShortKey(gtif.get(), GTModelTypeGeoKey);
+        contents.rasterType = ShortKey(gtif.get(), GTRasterTypeGeoKey);
+        contents.projected = ShortKey(gtif.get(), ProjectedCSTypeGeoKey);
+        contents.geographic = ShortKey(gtif.get(), GeographicTypeGeoKey);
+    }
+    return contents;
+}
+
+// A generated product in a folder of its own, with an output folder beside.
+struct Product {
+    explicit Product(rs2gen::ProductOptions optionsIn) : options(optionsIn) {
+        generated = rs2gen::GenerateProduct(folder.Path(), options);
+    }
+    std::string Xml(const std::string &suffix = "") const {
+        return Quoted(generated.productXml + suffix);
+    }
+    rs2test::TempDir folder;
+    rs2test::TempDir out;
+    rs2gen::ProductOptions options;
+    rs2gen::GeneratedProduct generated;
+};
+
+rs2gen::ProductOptions Options(const std::string &type, int width, int height,
+                               bool grid = true) {
+    rs2gen::ProductOptions options;
+    options.productType = type;
+    options.polarizations = {"HH", "HV"};
+    options.width = width;
+    options.height = height;
+    options.lutOffset = 3.5f;
+    options.geolocationGrid = grid;
+    return options;
+}
+
+// The window and output grid of an export, and where a position of the
+// dataset lands in the output grid.
+struct Grid {
+    int x, y, w, h, bw, bh;
+    std::string Arguments() const {
+        return " --window " + std::to_string(x) + " " + std::to_string(y) +
+               " " + std::to_string(w) + " " + std::to_string(h) + " --size " +
+               std::to_string(bw) + " " + std::to_string(bh);
+    }
+    double Column(double pixel) const { return (pixel - x) * bw / w; }
+    double Line(double line) const { return (line - y) * bh / h; }
+};
+
+// The image file's own tie points (pixel, line, longitude, latitude), as
+// the generator wrote them: pixel-is-area positions.
+std::vector<std::array<double, 4>> ImageTiePoints(const std::string &path) {
+    TiffKeeper tiff(XTIFFOpen(path.c_str(), "r"));
+    std::vector<std::array<double, 4>> points;
+    if (!tiff)
+        return points;
+    const std::vector<double> ties =
+        DoubleArray(tiff.get(), TIFFTAG_GEOTIEPOINTS);
+    for (size_t i = 0; i + 6 <= ties.size(); i += 6)
+        points.push_back({ties[i], ties[i + 1], ties[i + 3], ties[i + 4]});
+    return points;
+}
+
+// Raster position of a map position under an affine GeoTIFF matrix.
+std::array<double, 2> InverseAffine(const std::vector<double> &m, double x,
+                                    double y) {
+    const double dx = x - m[3];
+    const double dy = y - m[7];
+    const double determinant = m[0] * m[5] - m[1] * m[4];
+    return {(m[5] * dx - m[1] * dy) / determinant,
+            (m[0] * dy - m[4] * dx) / determinant};
+}
+
+using SampleCheck =
+    std::function<void(const TiffContents &, const Product &, int x, int y,
+                       int channel, size_t sample)>;
+
+} // namespace
+
+TEST(ExportCommand, writes_each_calibration_choice_in_its_sample_type) {
+    const Product sgf(Options("SGF", 23, 11));
+    const Product slc(Options("SLC", 19, 9));
+    const auto sigma = [](const Product &p) {
+        return rs2gen::LookupTableGains(p.options, "Sigma Nought");
+    };
+    struct Case {
+        const Product *product;
+        std::string suffix;
+        uint16_t bits, format, samplesPerChannel;
+        SampleCheck check;
+    };
+    const Case cases[] = {
+        {&sgf, "", 32, SAMPLEFORMAT_INT, 1,
+         [](const TiffContents &t, const Product &p, int x, int y, int c,
+            size_t s) {
+             EXPECT_EQ(t.Sample<int32_t>(s),
+                       rs2gen::DetectedSample(p.options, c, x, y));
+         }},
+        {&sgf, "?c=sigma", 32, SAMPLEFORMAT_IEEEFP, 1,
+         [&](const TiffContents &t, const Product &p, int x, int y, int c,
+             size_t s) {
+             const float dn = rs2gen::DetectedSample(p.options, c, x, y);
+             const float offset =
+                 rs2gen::LookupTableOffset(p.options, "Sigma Nought");
+             const float expected = (dn * dn + offset) / sigma(p)[x];
+             EXPECT_NEAR(t.Sample<float>(s), expected, 1e-6f * expected);
+         }},
+        {&slc, "", 16, SAMPLEFORMAT_INT, 2,
+         [](const TiffContents &t, const Product &p, int x, int y, int c,
+            size_t s) {
+             const auto [i, q] = rs2gen::ComplexSample(p.options, c, x, y);
+             EXPECT_EQ(t.Sample<int16_t>(2 * s), i);
+             EXPECT_EQ(t.Sample<int16_t>(2 * s + 1), q);
+         }},
+        {&slc, "?c=sigma", 64, SAMPLEFORMAT_COMPLEXIEEEFP, 1,
+         [&](const TiffContents &t, const Product &p, int x, int y, int c,
+             size_t s) {
+             const auto [i, q] = rs2gen::ComplexSample(p.options, c, x, y);
+             const float gain = sigma(p)[x];
+             EXPECT_NEAR(t.Sample<float>(2 * s), i / gain,
+                         1e-6f * std::fabs(i / gain));
+             EXPECT_NEAR(t.Sample<float>(2 * s + 1), q / gain,
+                         1e-6f * std::fabs(q / gain));
+         }},
+    };
+    for (const Case &c : cases) {
+        const Product &p = *c.product;
+        const std::string out = p.out.File("all.tif");
+        const CommandResult result =
+            RunShell(Rs2() + " export " + p.Xml(c.suffix) + " " + Quoted(out));
+        ASSERT_EQ(result.exitCode, 0) << result.errors;
+        const TiffContents t = ReadTiff(out);
+        const std::string label = p.options.productType + c.suffix;
+        ASSERT_EQ(t.width, static_cast<uint32_t>(p.options.width)) << label;
+        ASSERT_EQ(t.height, static_cast<uint32_t>(p.options.height)) << label;
+        EXPECT_EQ(t.bits, c.bits) << label;
+        EXPECT_EQ(t.format, c.format) << label;
+        ASSERT_EQ(t.samples, 2 * c.samplesPerChannel) << label;
+        for (int y = 0; y < p.options.height; ++y)
+            for (int x = 0; x < p.options.width; ++x)
+                for (int channel = 0; channel < 2; ++channel) {
+                    SCOPED_TRACE(label + " at " + std::to_string(x) + "," +
+                                 std::to_string(y));
+                    c.check(t, p, x, y, channel,
+                            (static_cast<size_t>(y) * p.options.width + x) * 2 +
+                                channel);
+                }
+    }
+}
+
+TEST(ExportCommand, windows_and_sizes_give_what_rs2_read_gives) {
+    const Product sgf(Options("SGF", 23, 11));
+    const Product slc(Options("SLC", 19, 9));
+    struct Case {
+        const Product *product;
+        std::string suffix;
+        Grid grid;
+        std::string channels;
+        bool complexIntegers; // read words pack I/Q; the file has int16 pairs
+    };
+    const Case cases[] = {
+        {&sgf, "?c=sigma", {3, 2, 12, 9, 6, 5}, "2,1", false},   // decimated
+        {&sgf, "", {0, 1, 5, 4, 11, 9}, "1", false},             // enlarged
+        {&sgf, "?c=gamma", {20, 0, 3, 11, 3, 11}, "1,2", false}, // edge strip
+        {&slc, "", {2, 1, 8, 6, 4, 12}, "2", true},              // mixed
+        {&slc, "?c=sigma", {0, 0, 19, 9, 5, 3}, "1,2", false},
+    };
+    for (const Case &c : cases) {
+        const Product &p = *c.product;
+        const Grid &g = c.grid;
+        const std::string label = p.options.productType + c.suffix +
+                                  g.Arguments() + " --channels " + c.channels;
+        const std::string out = p.out.File("window.tif");
+        const CommandResult exported =
+            RunShell(Rs2() + " export " + p.Xml(c.suffix) + " " + Quoted(out) +
+                     g.Arguments() + " --channels " + c.channels);
+        ASSERT_EQ(exported.exitCode, 0) << label << ": " << exported.errors;
+        const CommandResult read =
+            RunShell(Rs2() + " read --json " + p.Xml(c.suffix) + g.Arguments() +
+                     " --channels " + c.channels);
+        ASSERT_EQ(read.exitCode, 0) << label << ": " << read.errors;
+        const nlohmann::json expected = nlohmann::json::parse(read.output);
+        const TiffContents t = ReadTiff(out);
+        EXPECT_EQ(t.width, static_cast<uint32_t>(g.bw)) << label;
+        EXPECT_EQ(t.height, static_cast<uint32_t>(g.bh)) << label;
+        const nlohmann::json &data = expected["data"];
+        const bool real = expected["type"] == 4 || expected["type"] == 9;
+        // Four bytes a value: a float, an int32, or an int16 I/Q pair for
+        // each packed word.
+        ASSERT_EQ(t.pixels.size(), data.size() * 4) << label;
+        for (size_t k = 0; k < data.size(); ++k) {
+            if (c.complexIntegers) {
+                const auto word = static_cast<uint32_t>(data[k].get<int32_t>());
+                ASSERT_EQ(t.Sample<int16_t>(2 * k),
+                          static_cast<int16_t>(word & 0xFFFFu))
+                    << label << " value " << k;
+                ASSERT_EQ(t.Sample<int16_t>(2 * k + 1),
+                          static_cast<int16_t>(word >> 16))
+                    << label << " value " << k;
+            } else if (real) {
+                ASSERT_EQ(t.Sample<float>(k), data[k].get<float>())
+                    << label << " value " << k;
+            } else {
+                ASSERT_EQ(t.Sample<int32_t>(k), data[k].get<int32_t>())
+                    << label << " value " << k;
+            }
+        }
+    }
+}
+
+TEST(ExportCommand, utm_export_puts_each_tie_point_on_its_pixel) {
+    const Product sgf(Options("SGF", 60, 40));
+    const auto imageTies = ImageTiePoints(sgf.generated.imageFiles[0]);
+    ASSERT_GT(imageTies.size(), 10u);
+    const Grid grids[] = {{0, 0, 60, 40, 60, 40},
+                          {10, 5, 30, 20, 15, 40},
+                          {7, 3, 41, 33, 82, 11}};
+    for (const Grid &g : grids) {
+        const std::string out = sgf.out.File("utm.tif");
+        const CommandResult result =
+            RunShell(Rs2() + " export " + sgf.Xml("?c=sigma") + " " +
+                     Quoted(out) + g.Arguments());
+        ASSERT_EQ(result.exitCode, 0) << result.errors;
+        const TiffContents t = ReadTiff(out);
+        // The scene lies at 123.5 W, 49.2 N: WGS 84 / UTM zone 10N.
+        EXPECT_EQ(t.modelType, ModelTypeProjected) << g.Arguments();
+        EXPECT_EQ(t.projected, 32610) << g.Arguments();
+        EXPECT_EQ(t.rasterType, RasterPixelIsArea) << g.Arguments();
+        ASSERT_EQ(t.matrix.size(), 16u) << g.Arguments();
+        // Each tie point of the product, carried to UTM and through the
+        // inverse of the file's transform, lands on its position in the
+        // output grid (the affine transform fits the tie points to within
+        // a few hundredths of a pixel on this scene).
+        const double tolerance = 0.03 * std::max(1.0, 1.0 * g.bw / g.w);
+        for (const auto &[pixel, line, longitude, latitude] : imageTies) {
+            double easting = 0.0, northing = 0.0;
+            ASSERT_EQ(GCTPSimpleTransform("LONG D000", longitude, latitude,
+                                          "UTM 10 U D000", &easting, &northing),
+                      0);
+            const auto [column, row] =
+                InverseAffine(t.matrix, easting, northing);
+            EXPECT_NEAR(column, g.Column(pixel), tolerance)
+                << g.Arguments() << " tie point " << pixel << "," << line;
+            EXPECT_NEAR(row, g.Line(line), tolerance)
+                << g.Arguments() << " tie point " << pixel << "," << line;
+        }
+        // The file's own tie points are the same points, in the same system.
+        ASSERT_EQ(t.ties.size(), 6 * imageTies.size()) << g.Arguments();
+        for (size_t i = 0; i < t.ties.size(); i += 6) {
+            const auto [column, row] =
+                InverseAffine(t.matrix, t.ties[i + 3], t.ties[i + 4]);
+            EXPECT_NEAR(column, t.ties[i], tolerance) << g.Arguments();
+            EXPECT_NEAR(row, t.ties[i + 1], tolerance) << g.Arguments();
+        }
+    }
+}
+
+TEST(ExportCommand, without_a_map_transform_tie_points_georeference_in_wgs84) {
+    // Without the geolocation grid the dataset has no map transform; its
+    // ground control points are those of the image file.
+    const Product pixel(Options("SGF", 30, 20, false));
+    const auto imageTies = ImageTiePoints(pixel.generated.imageFiles[0]);
+    ASSERT_FALSE(imageTies.empty());
+    const Grid grids[] = {{0, 0, 30, 20, 30, 20}, {4, 6, 20, 10, 10, 30}};
+    for (const Grid &g : grids) {
+        const std::string out = pixel.out.File("gcps.tif");
+        const CommandResult result =
+            RunShell(Rs2() + " export " + pixel.Xml() + " " + Quoted(out) +
+                     g.Arguments());
+        ASSERT_EQ(result.exitCode, 0) << result.errors;
+        const TiffContents t = ReadTiff(out);
+        EXPECT_EQ(t.modelType, ModelTypeGeographic) << g.Arguments();
+        EXPECT_EQ(t.geographic, GCS_WGS_84) << g.Arguments();
+        EXPECT_EQ(t.rasterType, RasterPixelIsArea) << g.Arguments();
+        EXPECT_TRUE(t.matrix.empty()) << g.Arguments();
+        ASSERT_EQ(t.ties.size(), 6 * imageTies.size()) << g.Arguments();
+        for (size_t i = 0; i < imageTies.size(); ++i) {
+            const auto &[p, l, longitude, latitude] = imageTies[i];
+            EXPECT_NEAR(t.ties[6 * i], g.Column(p), 1e-9) << g.Arguments();
+            EXPECT_NEAR(t.ties[6 * i + 1], g.Line(l), 1e-9) << g.Arguments();
+            EXPECT_NEAR(t.ties[6 * i + 3], longitude, 1e-12);
+            EXPECT_NEAR(t.ties[6 * i + 4], latitude, 1e-12);
+        }
+    }
+}
+
+TEST(ExportCommand, bad_usage_and_failures_leave_no_file_behind) {
+    const Product sgf(Options("SGF", 24, 16));
+    rs2test::TempDir empty; // a folder without product.xml
+    const std::string out = Quoted(sgf.out.File("out.tif"));
+    struct Case {
+        std::string arguments;
+        int exitCode;
+        std::string message;
+    };
+    const Case cases[] = {
+        {sgf.Xml() + " " + out + " --channels 3", 2,
+         "channel 3 does not exist"},
+        {sgf.Xml() + " " + out + " --channels 0,1", 2, "channel 0"},
+        {sgf.Xml() + " " + out + " --size 0 5", 2, "--size"},
+        {sgf.Xml() + " " + out + " --window 0 0 0 4", 2, "at least 1"},
+        {sgf.Xml() + " " + out + " --window 1 2 3", 2, "--window"},
+        {sgf.Xml() + " " + out + " --window 20 0 10 1", 1,
+         "does not lie within the 24 x 16 raster"},
+        {sgf.Xml() + " " + out + " --window -1 0 4 4", 1, "does not lie"},
+        {sgf.Xml() + " " + Quoted(sgf.out.File("no/folder/out.tif")), 1,
+         "cannot write"},
+        {sgf.Xml("?c=sigma0") + " " + out, 1, "sigma0"},
+        {Quoted(empty.Path()) + " " + out, 1,
+         "no product.xml in " + empty.Path()},
+        {sgf.Xml(), 2, "OUT"},
+    };
+    for (const Case &c : cases) {
+        const CommandResult result = RunShell(Rs2() + " export " + c.arguments);
+        EXPECT_EQ(result.exitCode, c.exitCode) << c.arguments;
+        EXPECT_NE(result.errors.find(c.message), std::string::npos)
+            << c.arguments << ": " << result.errors;
+        EXPECT_TRUE(FolderEntries(sgf.out.Path()).empty()) << c.arguments;
+    }
+}
+
+TEST(ExportCommand, a_failed_write_exits_1_and_removes_the_partial_file) {
+    const Product sgf(Options("SGF", 300, 200));
+    const std::string out = sgf.out.File("big.tif");
+    // Files may grow to 64 blocks of 512 bytes; the signal that would kill
+    // the tool at the limit is ignored, so its writes fail instead.
+    const CommandResult result =
+        RunShell("ulimit -f 64; trap '' XFSZ; " + Rs2() + " export " +
+                 sgf.Xml() + " " + Quoted(out));
+    EXPECT_EQ(result.exitCode, 1) << result.errors;
+    EXPECT_NE(result.errors.find("big.tif.part-"), std::string::npos)
+        << result.errors;
+    EXPECT_TRUE(FolderEntries(sgf.out.Path()).empty());
+}
+
+TEST(ExportCommand, an_interrupted_export_leaves_no_partial_file) {
+    const Product sgf(Options("SGF", 24, 16));
+    const std::string out = sgf.out.File("huge.tif");
+    // Enlarged to 6000 x 6000 the export takes far longer than the 0.3 s
+    // after which it is told to stop.
+    const CommandResult result =
+        RunShell("timeout -s TERM 0.3 " + Rs2() + " export " + sgf.Xml() + " " +
+                 Quoted(out) + " --size 6000 6000");
+    const std::vector<std::string> left = FolderEntries(sgf.out.Path());
+    if (result.exitCode == 0) {
+        ASSERT_EQ(left, std::vector<std::string>{"huge.tif"});
+        GTEST_SKIP() << "the export finished before it was interrupted";
+    }
+    EXPECT_EQ(result.exitCode, 124); // timeout's code for a stopped command
+    EXPECT_TRUE(left.empty()) << left.front();
+}
+
+TEST(ExportCommand, draws_progress_only_on_a_terminal) {
+    const Product sgf(Options("SGF", 24, 16));
+    const std::string out = sgf.out.File("plain.tif");
+    const CommandResult plain =
+        RunShell(Rs2() + " export " + sgf.Xml() + " " + Quoted(out));
+    ASSERT_EQ(plain.exitCode, 0);
+    EXPECT_EQ(plain.errors, "");
+    EXPECT_EQ(plain.output, out + ": 24 x 16 pixels, 2 channel(s) of int32\n");
+    if (std::system("command -v script >/dev/null 2>&1") != 0)
+        GTEST_SKIP() << "no script(1) to give the tool a terminal";
+    // script(1) runs the tool on a pseudo-terminal and copies what it shows.
+    const std::string inner = Rs2() + " export " + sgf.Xml() + " " +
+                              Quoted(sgf.out.File("terminal.tif"));
+    const CommandResult terminal =
+        RunShell("script -qec \"" + inner + "\" /dev/null");
+    ASSERT_EQ(terminal.exitCode, 0) << terminal.errors;
+    EXPECT_NE(terminal.output.find("] 100%"), std::string::npos)
+        << terminal.output;
+}
+
+TEST(ExportCommand, product_folders_are_names_of_their_product) {
+    const Product sgf(Options("SGF", 24, 16));
+    const std::string folder = sgf.folder.Path();
+    const std::string xml = sgf.generated.productXml;
+    const std::pair<std::string, std::string> cases[] = {
+        {folder, xml},
+        {folder + "/", xml},
+        {folder + "?c=sigma", xml + "?c=sigma"},
+        {folder + ":Calibration Type:Beta Nought",
+         xml + ":Calibration Type:Beta Nought"},
+    };
+    for (const auto &[name, sameAs] : cases) {
+        const host::Raster byFolder = host::OpenRaster(name);
+        const host::Raster byFile = host::OpenRaster(sameAs);
+        EXPECT_EQ(byFolder.Name(), byFile.Name()) << name;
+        EXPECT_EQ(byFolder.ChannelType(1), byFile.ChannelType(1)) << name;
+    }
+    rs2test::TempDir empty;
+    try {
+        host::OpenRaster(empty.Path() + "?c=sigma");
+        ADD_FAILURE() << "opened a folder without product.xml";
+    } catch (const host::Error &error) {
+        EXPECT_EQ(std::string(error.what()),
+                  "no product.xml in " + empty.Path());
+    }
+    // The tool takes the folder form too, and writes the same file.
+    const std::string byFolder = sgf.out.File("folder.tif");
+    const std::string byFile = sgf.out.File("file.tif");
+    ASSERT_EQ(RunShell(Rs2() + " export " + Quoted(folder + "?c=sigma") + " " +
+                       Quoted(byFolder))
+                  .exitCode,
+              0);
+    ASSERT_EQ(RunShell(Rs2() + " export " + sgf.Xml("?c=sigma") + " " +
+                       Quoted(byFile))
+                  .exitCode,
+              0);
+    EXPECT_EQ(FileText(byFolder), FileText(byFile));
+}
+
+TEST(RasterBandReads, need_room_for_the_whole_read) {
+    const Product slc(Options("SLC", 8, 6));
+    const host::Raster calibrated =
+        host::OpenRaster(slc.generated.productXml + "?c=sigma");
+    const host::Raster raw = host::OpenRaster(slc.generated.productXml);
+    const host::Window window{1, 1, 4, 3};
+    const std::vector<int32_t> channels{1, 2};
+    // 4 x 3 pixels of two channels: 24 words, or 48 floats of complex data.
+    std::vector<float> reals(48, -1.0f);
+    EXPECT_THROW(
+        calibrated.ReadReal32Into(window, 4, 3, channels, reals.data(), 47),
+        host::Error);
+    EXPECT_EQ(reals.back(), -1.0f); // nothing written
+    calibrated.ReadReal32Into(window, 4, 3, channels, reals.data(), 48);
+    EXPECT_EQ(reals, calibrated.ReadReal32(window, 4, 3, channels));
+    std::vector<int32_t> words(24, -1);
+    EXPECT_THROW(raw.ReadInt32Into(window, 4, 3, channels, words.data(), 23),
+                 host::Error);
+    raw.ReadInt32Into(window, 4, 3, channels, words.data(), 24);
+    EXPECT_EQ(words, raw.ReadInt32(window, 4, 3, channels));
+}
