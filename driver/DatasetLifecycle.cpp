@@ -1,4 +1,5 @@
 #include "driver/DatasetLifecycle.hpp"
+#include "host/HostMemory.hpp"
 
 #include "driver/DatasetEntry.hpp"
 #include "driver/DatasetNames.hpp"
@@ -19,6 +20,7 @@
 #include <string>
 #include <strings.h>
 
+using host::FreeDeleter;
 using orv::core::fileio::DataSource;
 using orv::core::fileio::DataSourceFactory;
 using orv::core::fileio::File;
@@ -28,13 +30,6 @@ namespace {
 
 constexpr int32_t kErrAccess = 43;
 constexpr int32_t kDatasetHandleKind = 192;
-
-struct FreeDeleter {
-    void operator()(void *memory) const { std::free(memory); }
-};
-struct ListDeleter {
-    void operator()(char **list) const { DestroyStringList(list); }
-};
 
 // The product description path and calibration choice a canonical name
 // designates.
@@ -86,8 +81,7 @@ int32_t DeclaredChannelType(ZirOdi2CalibImage &model) {
 // through this driver's own table; a product without a usable orbit opens
 // all the same.
 void AttachOrbit(FILE *handle, ZirOdi2CalibImage &model) {
-    std::unique_ptr<char *, ListDeleter> list(
-        VXBMetaDataIO(handle, 0, 1, 0, nullptr));
+    host::HostList list(VXBMetaDataIO(handle, 0, 1, 0, nullptr));
     ProjInfo_t projection;
     InitProjInfo(&projection, 0);
     try {

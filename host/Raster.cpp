@@ -1,4 +1,5 @@
 #include "host/Raster.hpp"
+#include "host/HostMemory.hpp"
 
 #include "host/DriverRegistry.hpp"
 #include "host/ErrorReports.hpp"
@@ -19,6 +20,8 @@
 
 namespace host {
 namespace {
+
+using ListKeeper = HostList;
 
 constexpr int32_t kErrNoDataset = 1;
 constexpr int32_t kErrNoOrbit = 23;
@@ -42,15 +45,6 @@ template <typename Call> auto Guarded(Call &&call) -> decltype(call()) {
         throw Error(error.Number(), error.what());
     }
 }
-
-struct ListDeleter {
-    void operator()(char **list) const { DestroyStringList(list); }
-};
-using ListKeeper = std::unique_ptr<char *, ListDeleter>;
-
-struct FreeDeleter {
-    void operator()(void *memory) const { std::free(memory); }
-};
 
 std::vector<std::string> ListTexts(char *const *list) {
     std::vector<std::string> texts;

@@ -1,4 +1,5 @@
 #include "host/StringLists.hpp"
+#include "host/HostMemory.hpp"
 
 #include "host/TextServices.hpp"
 
@@ -14,9 +15,8 @@
 
 namespace {
 
-struct FreeDeleter {
-    void operator()(void *memory) const { std::free(memory); }
-};
+using host::FreeDeleter;
+
 using OwnedText = std::unique_ptr<char, FreeDeleter>;
 
 const char *TextOrEmpty(const char *text) {

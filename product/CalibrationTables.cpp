@@ -4,6 +4,7 @@
 // column.
 
 #include "product/CalibrationTables.hpp"
+#include "host/HostMemory.hpp"
 
 #include "host/ErrorReports.hpp"
 #include "host/StringLists.hpp"
@@ -31,15 +32,8 @@
 
 namespace {
 
-struct FreeDeleter {
-    void operator()(void *memory) const { std::free(memory); }
-};
-using HostText = std::unique_ptr<char, FreeDeleter>;
-
-struct StringListDeleter {
-    void operator()(char **list) const { DestroyStringList(list); }
-};
-using HostList = std::unique_ptr<char *, StringListDeleter>;
+using host::HostList;
+using host::HostText;
 
 constexpr char kLookupTableTag[] = "lookupTable";
 constexpr char kDefaultKind[] = "Sigma Nought";

@@ -2,6 +2,7 @@
 // image file through the host, then converted to the sample layout the
 // dataset announced and, for calibrated products, to backscatter.
 
+#include "host/HostMemory.hpp"
 #include "model/ZirOdi2CalibImage.hpp"
 
 #include "host/ErrorReports.hpp"
@@ -22,9 +23,7 @@
 
 namespace {
 
-struct FreeDeleter {
-    void operator()(void *memory) const { std::free(memory); }
-};
+using host::FreeDeleter;
 
 template <typename T> using HostArray = std::unique_ptr<T[], FreeDeleter>;
 

@@ -1,4 +1,5 @@
 #include "services/OrbitSegment.hpp"
+#include "host/HostMemory.hpp"
 
 #include "host/ErrorReports.hpp"
 #include "host/RasterServices.hpp"
@@ -9,11 +10,9 @@
 
 namespace {
 
-constexpr int32_t kErrNoOrbit = 23;
+using host::FreeDeleter;
 
-struct FreeDeleter {
-    void operator()(void *memory) const { std::free(memory); }
-};
+constexpr int32_t kErrNoOrbit = 23;
 
 } // namespace
 

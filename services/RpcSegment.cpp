@@ -1,3 +1,4 @@
+#include "host/HostMemory.hpp"
 #include "host/ModelSegments.hpp"
 #include "host/ProjectionServices.hpp"
 #include "host/RasterServices.hpp"
@@ -10,13 +11,11 @@
 
 namespace {
 
+using host::FreeDeleter;
+
 // An RPC model of an image without georeferencing maps geographic
 // coordinates; its block names them with this text.
 constexpr const char *kUngeoreferencedRpcGeosys = "LONG D0";
-
-struct FreeDeleter {
-    void operator()(void *memory) const { std::free(memory); }
-};
 
 // The image file of channel 1, or null when there is none or it cannot be
 // opened.
