@@ -1,6 +1,7 @@
 #include "host/GeoTiffWriter.hpp"
 #include "host/Raster.hpp"
 #include "tests/support/TempDir.hpp"
+#include "tests/support/TiffInspection.hpp"
 
 #include <geotiffio.h>
 #include <geovalues.h>
@@ -41,18 +42,8 @@ template <typename T> T Field(TIFF *tiff, ttag_t tag) {
     return value;
 }
 
-std::vector<double> DoubleArray(TIFF *tiff, ttag_t tag) {
-    uint16_t count = 0;
-    double *values = nullptr;
-    if (TIFFGetField(tiff, tag, &count, &values) != 1)
-        return {};
-    return std::vector<double>(values, values + count);
-}
-
-int ShortKey(GTIF *gtif, geokey_t key) {
-    unsigned short value = 0;
-    return GTIFKeyGetSHORT(gtif, key, &value, 0, 1) == 1 ? value : -1;
-}
+using rs2test::DoubleArray;
+using rs2test::ShortKey;
 
 // Bytes 2-3 of a little-endian TIFF header: 42 classic, 43 BigTIFF.
 int TiffVersion(const std::string &path) {

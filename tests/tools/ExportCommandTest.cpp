@@ -1,5 +1,6 @@
 #include "host/Raster.hpp"
 #include "tests/support/TempDir.hpp"
+#include "tests/support/TiffInspection.hpp"
 #include "tools/generator/ProductGenerator.hpp"
 
 #include <geotiffio.h>
@@ -94,18 +95,8 @@ struct TiffContents {
     }
 };
 
-std::vector<double> DoubleArray(TIFF *tiff, ttag_t tag) {
-    uint16_t count = 0;
-    double *values = nullptr;
-    if (TIFFGetField(tiff, tag, &count, &values) != 1)
-        return {};
-    return std::vector<double>(values, values + count);
-}
-
-int ShortKey(GTIF *gtif, geokey_t key) {
-    unsigned short value = 0;
-    return GTIFKeyGetSHORT(gtif, key, &value, 0, 1) == 1 ? value : -1;
-}
+using rs2test::DoubleArray;
+using rs2test::ShortKey;
 
 TiffContents ReadTiff(const std::string &path) {
     TiffContents contents;
