@@ -4,6 +4,9 @@
 // name only once it is complete.
 
 #include "tools/rs2/Commands.hpp"
+#include "tools/rs2/DatasetChoice.hpp"
+#include "tools/rs2/PartFile.hpp"
+#include "tools/rs2/ProgressBar.hpp"
 
 #include "host/GeoTiffWriter.hpp"
 #include "host/Raster.hpp"
@@ -11,19 +14,11 @@
 
 #include <algorithm>
 #include <array>
-#include <cerrno>
-#include <climits>
-#include <csignal>
 #include <cstddef>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
-#include <iterator>
-#include <numeric>
-#include <signal.h>
 #include <stdexcept>
-#include <sys/stat.h>
-#include <unistd.h>
 
 namespace {
 
@@ -77,17 +72,8 @@ host::SampleType SampleTypeOf(int32_t typeCode) {
 }
 
 std::vector<int32_t> CheckedChannels(const host::Raster &raster,
-                                     std::vector<int32_t> channels) {
-    if (channels.empty()) {
-        channels.resize(raster.ChannelCount());
-        std::iota(channels.begin(), channels.end(), 1);
-    }
-    for (int32_t channel : channels)
-        if (channel < 1 || channel > raster.ChannelCount())
-            throw CLI::ValidationError(
-                "--channels", "channel " + std::to_string(channel) +
-                                  " does not exist (the dataset has " +
-                                  std::to_string(raster.ChannelCount()) + ")");
+                                     const std::vector<int32_t> &chosen) {
+    const std::vector<int32_t> channels = ChosenChannels(raster, chosen);
     const int32_t type = raster.ChannelType(channels.front());
     for (int32_t channel : channels)
         if (raster.ChannelType(channel) != type)
@@ -294,128 +280,6 @@ void ReadBand(const host::Raster &raster, const ExportPlan &plan,
     }
 }
 
-// A one-line bar on stderr, drawn only when stderr is a terminal: logs and
-// pipes get no control characters.
-class ProgressBar {
-  public:
-    explicit ProgressBar(int64_t totalIn)
-        : total(totalIn), shown(isatty(STDERR_FILENO) == 1) {}
-    ~ProgressBar() {
-        if (drawn)
-            std::fputc('\n', stderr);
-    }
-    ProgressBar(const ProgressBar &) = delete;
-    ProgressBar &operator=(const ProgressBar &) = delete;
-
-    void Update(int64_t done) {
-        if (!shown || total <= 0)
-            return;
-        const int percent = static_cast<int>(done * 100 / total);
-        if (percent == lastPercent)
-            return;
-        lastPercent = percent;
-        const int filled = percent * kWidth / 100;
-        std::fprintf(stderr, "\rexport [%s%s] %3d%%",
-                     std::string(filled, '#').c_str(),
-                     std::string(kWidth - filled, ' ').c_str(), percent);
-        std::fflush(stderr);
-        drawn = true;
-    }
-
-  private:
-    static constexpr int kWidth = 40;
-    int64_t total;
-    bool shown;
-    bool drawn = false;
-    int lastPercent = -1;
-};
-
-// The path of the unfinished output, for the signal handler: an interrupted
-// export removes it as a failed one does. Written only while no handler can
-// read it (armed is 0).
-char interruptedPath[PATH_MAX];
-volatile std::sig_atomic_t armed = 0;
-constexpr int kCleanedSignals[] = {SIGINT, SIGTERM, SIGHUP};
-struct sigaction previousActions[std::size(kCleanedSignals)];
-
-extern "C" void RemovePartAndDie(int signalNumber) {
-    if (armed)
-        ::unlink(interruptedPath);
-    struct sigaction fallback {};
-    fallback.sa_handler = SIG_DFL;
-    ::sigaction(signalNumber, &fallback, nullptr);
-    ::raise(signalNumber);
-}
-
-// Signals the user ignores (SIGHUP under nohup) stay ignored.
-void ArmSignalCleanup() {
-    armed = 1;
-    for (size_t i = 0; i < std::size(kCleanedSignals); ++i) {
-        ::sigaction(kCleanedSignals[i], nullptr, &previousActions[i]);
-        if (previousActions[i].sa_handler == SIG_IGN)
-            continue;
-        struct sigaction action {};
-        action.sa_handler = RemovePartAndDie;
-        sigemptyset(&action.sa_mask);
-        ::sigaction(kCleanedSignals[i], &action, nullptr);
-    }
-}
-
-void DisarmSignalCleanup() {
-    for (size_t i = 0; i < std::size(kCleanedSignals); ++i)
-        ::sigaction(kCleanedSignals[i], &previousActions[i], nullptr);
-    armed = 0;
-}
-
-// The output under construction: OUT.part-XXXXXX beside OUT, so that the
-// final rename stays within one file system and OUT is either the old file
-// or the complete new one. Removed unless committed, also on SIGINT, SIGTERM
-// and SIGHUP.
-class PartFile {
-  public:
-    explicit PartFile(const std::string &targetIn) : target(targetIn) {
-        std::string pattern = target + ".part-XXXXXX";
-        if (pattern.size() >= sizeof interruptedPath)
-            throw std::runtime_error(target + ": the path is too long");
-        const int descriptor = ::mkstemp(pattern.data());
-        if (descriptor < 0)
-            throw std::runtime_error("cannot write " + target + ": " +
-                                     std::strerror(errno));
-        path = pattern;
-        // mkstemp makes the file private; the result gets the permissions
-        // of any new file.
-        const mode_t mask = ::umask(0);
-        ::umask(mask);
-        ::fchmod(descriptor, 0666 & ~mask);
-        ::close(descriptor);
-        std::memcpy(interruptedPath, path.c_str(), path.size() + 1);
-        ArmSignalCleanup();
-    }
-    ~PartFile() {
-        if (!committed) {
-            ::unlink(path.c_str());
-            DisarmSignalCleanup();
-        }
-    }
-    PartFile(const PartFile &) = delete;
-    PartFile &operator=(const PartFile &) = delete;
-
-    const std::string &Path() const { return path; }
-
-    void Commit() {
-        if (::rename(path.c_str(), target.c_str()) != 0)
-            throw std::runtime_error("cannot write " + target + ": " +
-                                     std::strerror(errno));
-        committed = true;
-        DisarmSignalCleanup();
-    }
-
-  private:
-    std::string target;
-    std::string path;
-    bool committed = false;
-};
-
 // Band height: whole strips of the file, about kBandBytes.
 int32_t BandRows(const host::GeoTiffWriter &writer, int32_t height) {
     const auto strip = static_cast<size_t>(writer.RowsPerStrip());
@@ -453,7 +317,7 @@ void RunExport(const ExportOptions &options) {
         // Every sample type takes four bytes a value (a float, a word, or
         // an int16 pair).
         BandBuffer band(plan, writer.RowBytes() / 4, bandRows);
-        ProgressBar progress(plan.height);
+        ProgressBar progress("export", plan.height);
         for (int32_t row = 0; row < plan.height; row += bandRows) {
             const int32_t rows = std::min(bandRows, plan.height - row);
             ReadBand(raster, plan, row, rows, band);

@@ -1,11 +1,11 @@
 #include "tools/rs2/Commands.hpp"
+#include "tools/rs2/DatasetChoice.hpp"
 
 #include "host/Raster.hpp"
 
 #include <nlohmann/json.hpp>
 
 #include <iostream>
-#include <numeric>
 #include <stdexcept>
 
 namespace {
@@ -42,16 +42,8 @@ void RunRead(const ReadOptions &options) {
         options.bufferSize.empty() ? window.width : options.bufferSize[0];
     int32_t height =
         options.bufferSize.empty() ? window.height : options.bufferSize[1];
-    std::vector<int32_t> channels = options.channels;
-    if (channels.empty()) {
-        channels.resize(raster.ChannelCount());
-        std::iota(channels.begin(), channels.end(), 1);
-    }
-    for (int32_t channel : channels)
-        if (channel < 1 || channel > raster.ChannelCount())
-            throw CLI::ValidationError("--channels",
-                                       "channel " + std::to_string(channel) +
-                                           " does not exist");
+    const std::vector<int32_t> channels =
+        ChosenChannels(raster, options.channels);
     int32_t type = raster.ChannelType(channels.front());
     // Real channels (4, 9) are read as floats, the others as integers,
     // unless the user chooses.
