@@ -1,5 +1,7 @@
 #include "host/Raster.hpp"
+#include "tests/support/CommandRun.hpp"
 #include "tests/support/TempDir.hpp"
+#include "tests/support/TiffContents.hpp"
 #include "tests/support/TiffInspection.hpp"
 #include "tools/generator/ProductGenerator.hpp"
 
@@ -20,112 +22,25 @@
 #include <memory>
 #include <sstream>
 #include <string>
-#include <sys/wait.h>
 #include <vector>
 
 namespace {
 
 namespace fs = std::filesystem;
 
-struct CommandResult {
-    int exitCode;
-    std::string output; // standard output
-    std::string errors; // standard error
-};
-
-std::string Quoted(const std::string &text) { return "'" + text + "'"; }
-
-std::string FileText(const std::string &path) {
-    std::ifstream file(path, std::ios::binary);
-    std::ostringstream text;
-    text << file.rdbuf();
-    return text.str();
-}
+using rs2test::CommandResult;
+using rs2test::FileText;
+using rs2test::FolderEntries;
+using rs2test::Quoted;
+using rs2test::RunShell;
 
 // The tool, quoted for the shell.
 std::string Rs2() { return Quoted(RS2_TOOL); }
 
-// Runs a shell command line; its standard error goes to a file of a scratch
-// folder of its own (so that output folders hold only what the tool wrote)
-// and is read back.
-CommandResult RunShell(const std::string &line) {
-    static const rs2test::TempDir scratch;
-    const std::string errors = scratch.File("stderr.txt");
-    const std::string command = "{ " + line + "; } 2>" + Quoted(errors);
-    FILE *pipe = popen(command.c_str(), "r");
-    if (pipe == nullptr)
-        return {-1, "", ""};
-    std::string output;
-    std::array<char, 4096> chunk{};
-    size_t read = 0;
-    while ((read = std::fread(chunk.data(), 1, chunk.size(), pipe)) > 0)
-        output.append(chunk.data(), read);
-    const int status = pclose(pipe);
-    return {WIFEXITED(status) ? WEXITSTATUS(status) : -1, output,
-            FileText(errors)};
-}
-
-std::vector<std::string> FolderEntries(const std::string &folder) {
-    std::vector<std::string> names;
-    for (const auto &entry : fs::directory_iterator(folder))
-        names.push_back(entry.path().filename().string());
-    return names;
-}
-
-struct TiffCloser {
-    void operator()(TIFF *tiff) const { XTIFFClose(tiff); }
-};
-using TiffKeeper = std::unique_ptr<TIFF, TiffCloser>;
-struct GtifDeleter {
-    void operator()(GTIF *gtif) const { GTIFFree(gtif); }
-};
-
-// What a GeoTIFF holds, read with libtiff and libgeotiff alone.
-struct TiffContents {
-    uint32_t width = 0, height = 0;
-    uint16_t bits = 0, format = 0, samples = 0;
-    std::vector<unsigned char> pixels;
-    int modelType = -1, rasterType = -1, projected = -1, geographic = -1;
-    std::vector<double> matrix, ties;
-
-    template <typename T> T Sample(size_t index) const {
-        T value;
-        std::memcpy(&value, pixels.data() + index * sizeof(T), sizeof(T));
-        return value;
-    }
-};
-
 using rs2test::DoubleArray;
-using rs2test::ShortKey;
-
-TiffContents ReadTiff(const std::string &path) {
-    TiffContents contents;
-    TiffKeeper tiff(XTIFFOpen(path.c_str(), "r"));
-    if (!tiff)
-        return contents;
-    TIFF *t = tiff.get();
-    TIFFGetField(t, TIFFTAG_IMAGEWIDTH, &contents.width);
-    TIFFGetField(t, TIFFTAG_IMAGELENGTH, &contents.height);
-    TIFFGetFieldDefaulted(t, TIFFTAG_BITSPERSAMPLE, &contents.bits);
-    TIFFGetFieldDefaulted(t, TIFFTAG_SAMPLEFORMAT, &contents.format);
-    TIFFGetFieldDefaulted(t, TIFFTAG_SAMPLESPERPIXEL, &contents.samples);
-    const auto rowBytes = static_cast<size_t>(TIFFScanlineSize64(t));
-    contents.pixels.resize(rowBytes * contents.height);
-    for (uint32_t row = 0; row < contents.height; ++row)
-        if (TIFFReadScanline(t, contents.pixels.data() + rowBytes * row, row,
-                             0) != 1)
-            return {};
-    contents.matrix = DoubleArray(t, TIFFTAG_GEOTRANSMATRIX);
-    contents.ties = DoubleArray(t, TIFFTAG_GEOTIEPOINTS);
-    std::unique_ptr<GTIF, GtifDeleter> gtif(GTIFNew(t));
-    if (gtif) {
-        contents.modelType = ShortKey(gtif.get(), GTModelTypeGeoKey);
-        contents.rasterType = ShortKey(gtif.get(), GTRasterTypeGeoKey);
-        contents.projected = ShortKey(gtif.get(), ProjectedCSTypeGeoKey);
-        contents.geographic = ShortKey(gtif.get(), GeographicTypeGeoKey);
-    }
-    return contents;
-}
+using rs2test::ReadTiff;
+using rs2test::TiffContents;
+using rs2test::TiffKeeper;
 
 // A generated product in a folder of its own, with an output folder beside.
 struct Product {
@@ -419,9 +334,9 @@ TEST(ExportCommand, bad_usage_and_failures_leave_no_file_behind) {
         {sgf.Xml() + " " + out + " --size 0 5", 2, "--size"},
         {sgf.Xml() + " " + out + " --window 0 0 0 4", 2, "at least 1"},
         {sgf.Xml() + " " + out + " --window 1 2 3", 2, "--window"},
-        {sgf.Xml() + " " + out + " --window 20 0 10 1", 1,
+        {sgf.Xml() + " " + out + " --window 20 0 10 1", 2,
          "does not lie within the 24 x 16 raster"},
-        {sgf.Xml() + " " + out + " --window -1 0 4 4", 1, "does not lie"},
+        {sgf.Xml() + " " + out + " --window -1 0 4 4", 2, "does not lie"},
         {sgf.Xml() + " " + Quoted(sgf.out.File("no/folder/out.tif")), 1,
          "cannot write"},
         {sgf.Xml("?c=sigma0") + " " + out, 1, "sigma0"},

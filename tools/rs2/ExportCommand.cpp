@@ -1,22 +1,22 @@
 // rs2 export: a window of a dataset, resampled to an output grid, written as
-// a GeoTIFF band of rows by band of rows with the dataset's georeferencing.
-// Memory holds one band whatever the image size; the file appears under its
-// name only once it is complete.
+// a GeoTIFF band of rows by band of rows with the dataset's georeferencing;
+// as the dataset's samples, or as backscatter (power or dB, noise removed,
+// multilooked). Memory holds one band whatever the image size; the file
+// appears under its name only once it is complete.
 
 #include "tools/rs2/Commands.hpp"
 #include "tools/rs2/DatasetChoice.hpp"
+#include "tools/rs2/ExportGeoreferencing.hpp"
+#include "tools/rs2/ExportPlan.hpp"
 #include "tools/rs2/PartFile.hpp"
 #include "tools/rs2/ProgressBar.hpp"
 
 #include "host/GeoTiffWriter.hpp"
 #include "host/Raster.hpp"
-#include "host/RasterServices.hpp"
 
 #include <algorithm>
-#include <array>
 #include <cstddef>
 #include <cstdio>
-#include <cstdlib>
 #include <cstring>
 #include <stdexcept>
 
@@ -30,161 +30,9 @@ namespace {
 // faulted in again.
 constexpr size_t kBandBytes = size_t{512} << 10;
 
-struct ExportOptions {
-    std::string name;
-    std::string output;
-    std::vector<int32_t> window;     // x y w h
-    std::vector<int32_t> bufferSize; // bw bh
-    std::vector<int32_t> channels;
-};
-
-// What is written: a window of the dataset, the grid it is resampled to,
-// and the channels in the file's sample layout.
-struct ExportPlan {
-    host::Window window;
-    int32_t width = 0; // output grid, pixels
-    int32_t height = 0;
-    std::vector<int32_t> channels;
-    host::SampleType sampleType = host::SampleType::Float32;
-};
-
-// Real channels keep their layout; integer ones are written as int32, and
-// complex integers as in-phase/quadrature int16 pairs.
-host::SampleType SampleTypeOf(int32_t typeCode) {
-    switch (typeCode) {
-    case kChanFloat32:
-        return host::SampleType::Float32;
-    case kChanComplexFloat32:
-        return host::SampleType::ComplexFloat32;
-    case kChanComplexInt16:
-        return host::SampleType::ComplexInt16;
-    case kChanInt32:
-    case kChanUInt16:
-    case kChanInt16:
-    case kChanUInt8:
-    case kChanUInt32:
-        return host::SampleType::Int32;
-    default:
-        throw std::runtime_error("channels of type " +
-                                 std::to_string(typeCode) +
-                                 " cannot be exported");
-    }
-}
-
-std::vector<int32_t> CheckedChannels(const host::Raster &raster,
-                                     const std::vector<int32_t> &chosen) {
-    const std::vector<int32_t> channels = ChosenChannels(raster, chosen);
-    const int32_t type = raster.ChannelType(channels.front());
-    for (int32_t channel : channels)
-        if (raster.ChannelType(channel) != type)
-            throw CLI::ValidationError(
-                "--channels", "channels " + std::to_string(channels.front()) +
-                                  " and " + std::to_string(channel) +
-                                  " have different types; export them "
-                                  "separately");
-    return channels;
-}
-
-ExportPlan PlanExport(const host::Raster &raster,
-                      const ExportOptions &options) {
-    ExportPlan plan;
-    plan.window = {0, 0, raster.Width(), raster.Height()};
-    if (!options.window.empty()) {
-        const std::vector<int32_t> &w = options.window;
-        plan.window = {w[0], w[1], w[2], w[3]};
-        if (w[2] < 1 || w[3] < 1)
-            throw CLI::ValidationError("--window",
-                                       "width and height must be at least 1");
-        if (w[0] < 0 || w[1] < 0 || w[2] > raster.Width() - w[0] ||
-            w[3] > raster.Height() - w[1])
-            throw std::runtime_error(
-                "window " + std::to_string(w[0]) + " " + std::to_string(w[1]) +
-                " " + std::to_string(w[2]) + " " + std::to_string(w[3]) +
-                " does not lie within the " + std::to_string(raster.Width()) +
-                " x " + std::to_string(raster.Height()) + " raster");
-    }
-    plan.width =
-        options.bufferSize.empty() ? plan.window.width : options.bufferSize[0];
-    plan.height =
-        options.bufferSize.empty() ? plan.window.height : options.bufferSize[1];
-    plan.channels = CheckedChannels(raster, options.channels);
-    plan.sampleType = SampleTypeOf(raster.ChannelType(plan.channels.front()));
-    return plan;
-}
-
-// The transform of the output grid: its origin at the window's corner, its
-// steps scaled by the resampling (pixel-is-area positions, see ProjInfo_t).
-std::array<double, 6> WindowTransform(const double *t, const ExportPlan &plan) {
-    const double x = plan.window.x;
-    const double y = plan.window.y;
-    const double columnScale =
-        static_cast<double>(plan.window.width) / plan.width;
-    const double lineScale =
-        static_cast<double>(plan.window.height) / plan.height;
-    return {t[0] + x * t[1] + y * t[2], t[1] * columnScale, t[2] * lineScale,
-            t[3] + x * t[4] + y * t[5], t[4] * columnScale, t[5] * lineScale};
-}
-
-// The dataset's ground control points in the file's system, at their
-// positions in the output grid. Points that cannot be carried into that
-// system are left out.
-std::vector<host::TiePoint> OutputTiePoints(const host::GcpSet &gcps,
-                                            const char *groundGeosys,
-                                            const std::string &fileGeosys,
-                                            const ExportPlan &plan) {
-    const double columnScale =
-        static_cast<double>(plan.width) / plan.window.width;
-    const double lineScale =
-        static_cast<double>(plan.height) / plan.window.height;
-    const bool sameSystem = fileGeosys == groundGeosys;
-    std::vector<host::TiePoint> ties;
-    for (const host::GroundControlPoint &gcp : gcps.points) {
-        double x = gcp.x;
-        double y = gcp.y;
-        if (!sameSystem && GCTPSimpleTransform(groundGeosys, gcp.x, gcp.y,
-                                               fileGeosys.c_str(), &x, &y) != 0)
-            continue;
-        ties.push_back({(gcp.pixel - plan.window.x) * columnScale,
-                        (gcp.line - plan.window.y) * lineScale, x, y, gcp.z});
-    }
-    return ties;
-}
-
-// A GeoTIFF holds one model system: a UTM or geographic dataset gives its
-// transform, and its ground control points join it in that system; without
-// a map transform the points alone georeference the file, in WGS 84.
-host::GeoTiffGeoreferencing OutputGeoreferencing(const host::Raster &raster,
-                                                 const ExportPlan &plan) {
-    host::GeoTiffGeoreferencing geo;
-    const ProjInfo_t projection = raster.Projection();
-    char system[kGeosysTextSize] = {};
-    const int32_t code = DecodeGeosys(projection.geosys, system);
-    if (code == kGeosysUTM || code == kGeosysLong) {
-        geo.geosys = system;
-        geo.hasTransform = true;
-        geo.transform = WindowTransform(projection.transform, plan);
-    }
-    const host::GcpSet gcps = raster.GroundControlPoints();
-    char ground[kGeosysTextSize] = {};
-    const int32_t groundCode = DecodeGeosys(gcps.groundGeosys.c_str(), ground);
-    if (gcps.points.empty() ||
-        (groundCode != kGeosysUTM && groundCode != kGeosysLong))
-        return geo;
-    if (geo.geosys.empty()) {
-        char geographic[kGeosysTextSize] = {};
-        DecodeGeosys("LONG D000", geographic);
-        geo.geosys = geographic;
-    }
-    geo.tiePoints = OutputTiePoints(gcps, ground, geo.geosys, plan);
-    if (!geo.hasTransform && geo.tiePoints.empty())
-        geo.geosys.clear();
-    return geo;
-}
-
-// One band of output rows, in the file's sample layout. Real channels are
-// read as floats, integer ones as 32-bit words; complex integer words are
-// rewritten in place as their in-phase and quadrature int16 halves. The
-// buffer is allocated once and read into band after band.
+// One band of rows of the grid, as read: real channels as floats, integer
+// ones as 32-bit words. The buffer is allocated once and read into band
+// after band.
 class BandBuffer {
   public:
     BandBuffer(const ExportPlan &planIn, size_t rowValues, int32_t rows)
@@ -196,8 +44,8 @@ class BandBuffer {
             words.resize(values);
     }
 
-    // Reads sourceRows window rows from sourceRow, resampled to rows output
-    // rows, into the band from output row atRow of the band on.
+    // Reads sourceRows window rows from sourceRow, resampled to rows grid
+    // rows, into the band from its row atRow on.
     void Read(const host::Raster &raster, int32_t sourceRow, int32_t sourceRows,
               int32_t rows, int32_t atRow) {
         const host::Window window{plan.window.x, sourceRow, plan.window.width,
@@ -205,13 +53,11 @@ class BandBuffer {
         const size_t first = valuesPerRow * static_cast<size_t>(atRow);
         const size_t count = valuesPerRow * static_cast<size_t>(rows);
         if (IsReal())
-            raster.ReadReal32Into(window, plan.width, rows, plan.channels,
+            raster.ReadReal32Into(window, plan.gridWidth, rows, plan.channels,
                                   reals.data() + first, count);
         else
-            raster.ReadInt32Into(window, plan.width, rows, plan.channels,
+            raster.ReadInt32Into(window, plan.gridWidth, rows, plan.channels,
                                  words.data() + first, count);
-        if (plan.sampleType == host::SampleType::ComplexInt16)
-            SplitComplexWords(first, count);
     }
 
     void CopyRow(int32_t from, int32_t to) {
@@ -229,17 +75,13 @@ class BandBuffer {
         return IsReal() ? static_cast<const void *>(reals.data())
                         : static_cast<const void *>(words.data());
     }
-
-  private:
-    bool IsReal() const {
-        return plan.sampleType == host::SampleType::Float32 ||
-               plan.sampleType == host::SampleType::ComplexFloat32;
-    }
+    const float *Reals() const { return reals.data(); }
+    const int32_t *Words() const { return words.data(); }
 
     // A word packs in-phase (low half) and quadrature (high half); the file
     // wants the two int16 samples in that order, in native byte order.
-    void SplitComplexWords(size_t first, size_t count) {
-        for (size_t i = first; i < first + count; ++i) {
+    void SplitComplexWords() {
+        for (size_t i = 0; i < words.size(); ++i) {
             const auto word = static_cast<uint32_t>(words[i]);
             const int16_t pair[2] = {static_cast<int16_t>(word & 0xFFFFu),
                                      static_cast<int16_t>(word >> 16)};
@@ -247,27 +89,30 @@ class BandBuffer {
         }
     }
 
+  private:
+    bool IsReal() const { return plan.ReadsReals(); }
+
     const ExportPlan &plan;
     size_t valuesPerRow;
     std::vector<float> reals;
     std::vector<int32_t> words;
 };
 
-// The window row output row `row` samples: window.y + floor(row * h / bh),
+// The window row grid row `row` samples: window.y + floor(row * h / bh),
 // the host's nearest-neighbour rule.
 int32_t SourceRow(const ExportPlan &plan, int32_t row) {
     return plan.window.y +
            static_cast<int32_t>(static_cast<int64_t>(row) * plan.window.height /
-                                plan.height);
+                                plan.gridHeight);
 }
 
-// Output rows [firstRow, firstRow + rows) into band. Without vertical
-// resampling they are one read of as many window rows; otherwise each output
+// Grid rows [firstRow, firstRow + rows) into band. Without vertical
+// resampling they are one read of as many window rows; otherwise each grid
 // row is its own one-row read, so that every row samples exactly the window
 // row the host's rule names (a repeated row is copied, not read again).
 void ReadBand(const host::Raster &raster, const ExportPlan &plan,
               int32_t firstRow, int32_t rows, BandBuffer &band) {
-    if (plan.height == plan.window.height) {
+    if (plan.gridHeight == plan.window.height) {
         band.Read(raster, SourceRow(plan, firstRow), rows, rows, 0);
         return;
     }
@@ -303,7 +148,77 @@ const char *SampleTypeName(host::SampleType type) {
     return "";
 }
 
-void RunExport(const ExportOptions &options) {
+// Writes the grid's samples as they are read, band after band.
+void WriteSamples(const host::Raster &raster, const ExportPlan &plan,
+                  host::GeoTiffWriter &writer) {
+    const int32_t bandRows = BandRows(writer, plan.height);
+    BandBuffer band(plan, plan.gridWidth * plan.ReadValuesPerPixel(), bandRows);
+    ProgressBar progress("export", plan.height);
+    for (int32_t row = 0; row < plan.height; row += bandRows) {
+        const int32_t rows = std::min(bandRows, plan.height - row);
+        ReadBand(raster, plan, row, rows, band);
+        if (plan.readType == host::SampleType::ComplexInt16)
+            band.SplitComplexWords();
+        writer.WriteRows(row, rows, band.Data());
+        progress.Update(row + rows);
+    }
+}
+
+// Output rows of a backscatter band: whole strips of the file when the grid
+// rows they take fit kBandBytes, else fewer.
+int32_t BackscatterBandRows(const host::GeoTiffWriter &writer,
+                            const ExportPlan &plan) {
+    const size_t gridRowBytes = static_cast<size_t>(plan.gridWidth) *
+                                plan.ReadValuesPerPixel() * sizeof(float);
+    const size_t fitting = std::max<size_t>(
+        1, kBandBytes / (gridRowBytes * static_cast<size_t>(plan.looks.lines)));
+    return std::min(BandRows(writer, plan.height),
+                    static_cast<int32_t>(std::min<size_t>(
+                        fitting, static_cast<size_t>(plan.height))));
+}
+
+// Writes backscatter: each band of grid rows becomes power, loses the noise,
+// is multilooked and turned into dB as the plan says.
+void WriteBackscatter(const host::Raster &raster, const ExportPlan &plan,
+                      host::GeoTiffWriter &writer) {
+    const int32_t bandRows = BackscatterBandRows(writer, plan);
+    const int32_t gridBandRows = bandRows * plan.looks.lines;
+    const size_t channels = plan.channels.size();
+    BandBuffer band(plan, plan.gridWidth * plan.ReadValuesPerPixel(),
+                    gridBandRows);
+    std::vector<float> power(static_cast<size_t>(plan.gridWidth) * channels *
+                             gridBandRows);
+    std::vector<float> looked(static_cast<size_t>(plan.width) * channels *
+                              bandRows);
+    ProgressBar progress("export", plan.height);
+    for (int32_t row = 0; row < plan.height; row += bandRows) {
+        const int32_t rows = std::min(bandRows, plan.height - row);
+        const int32_t gridRow = row * plan.looks.lines;
+        const int32_t gridRows =
+            std::min(rows * plan.looks.lines, plan.gridHeight - gridRow);
+        ReadBand(raster, plan, gridRow, gridRows, band);
+        const size_t pixels = static_cast<size_t>(plan.gridWidth) * gridRows;
+        if (plan.ReadsReals())
+            PowerFromReals(band.Reals(), pixels, channels, plan.powerRule,
+                           power.data());
+        else
+            PowerFromWords(band.Words(), pixels, channels, plan.powerRule,
+                           power.data());
+        if (!plan.noise.empty())
+            SubtractNoise(power.data(), plan.gridWidth, gridRows, channels,
+                          plan.noise, plan.clamp);
+        Multilook(power.data(), plan.gridWidth, gridRows, channels, plan.looks,
+                  looked.data());
+        const size_t values = static_cast<size_t>(plan.width) * channels * rows;
+        if (plan.decibels)
+            ToDecibels(looked.data(), values);
+        writer.WriteRows(row, rows, looked.data());
+        progress.Update(row + rows);
+    }
+}
+
+void RunExport(ExportOptions options) {
+    options.name = NameWithCalibration(options.name, options.calibration);
     host::Raster raster = host::OpenRaster(options.name);
     const ExportPlan plan = PlanExport(raster, options);
     const host::GeoTiffGeoreferencing geo = OutputGeoreferencing(raster, plan);
@@ -313,23 +228,17 @@ void RunExport(const ExportOptions &options) {
                                    static_cast<int32_t>(plan.channels.size()),
                                    plan.sampleType);
         writer.SetGeoreferencing(geo);
-        const int32_t bandRows = BandRows(writer, plan.height);
-        // Every sample type takes four bytes a value (a float, a word, or
-        // an int16 pair).
-        BandBuffer band(plan, writer.RowBytes() / 4, bandRows);
-        ProgressBar progress("export", plan.height);
-        for (int32_t row = 0; row < plan.height; row += bandRows) {
-            const int32_t rows = std::min(bandRows, plan.height - row);
-            ReadBand(raster, plan, row, rows, band);
-            writer.WriteRows(row, rows, band.Data());
-            progress.Update(row + rows);
-        }
+        if (plan.backscatter)
+            WriteBackscatter(raster, plan, writer);
+        else
+            WriteSamples(raster, plan, writer);
         writer.Close();
     }
     part.Commit();
-    std::printf("%s: %d x %d pixels, %zu channel(s) of %s\n",
+    std::printf("%s: %d x %d pixels, %zu channel(s) of %s%s\n",
                 options.output.c_str(), plan.width, plan.height,
-                plan.channels.size(), SampleTypeName(plan.sampleType));
+                plan.channels.size(), SampleTypeName(plan.sampleType),
+                plan.decibels ? " (dB)" : "");
 }
 
 } // namespace
@@ -338,12 +247,13 @@ void AddExportCommand(CLI::App &app) {
     static ExportOptions options;
     CLI::App *command = app.add_subcommand(
         "export",
-        "Write the channels as a GeoTIFF in the dataset's sample type, with "
-        "its georeferencing (UTM transform and ground control points, or "
-        "ground control points in WGS 84)");
+        "Write the channels as a GeoTIFF with the dataset's georeferencing "
+        "(UTM transform and ground control points, or ground control points "
+        "in WGS 84): as the dataset's samples, or as backscatter power or dB");
     command->add_option("NAME", options.name, "dataset name")->required();
     command->add_option("OUT", options.output, "GeoTIFF file to write")
         ->required();
+    AddCalibrationOption(command, options.calibration);
     command->add_option("--window", options.window, "X Y W H (default: all)")
         ->expected(4);
     command
@@ -353,10 +263,37 @@ void AddExportCommand(CLI::App &app) {
         ->check(CLI::PositiveNumber);
     command->add_option("--channels", options.channels, "e.g. 1,2")
         ->delimiter(',');
+    command->add_flag("--db", options.decibels,
+                      "write 10*log10 of the power; zero and negative power "
+                      "(possible after --denoise) become NaN");
+    command->add_flag("--denoise", options.denoise,
+                      "subtract the noise-equivalent backscatter product.xml "
+                      "gives for the chosen calibration");
+    command->add_flag("--clamp", options.clamp,
+                      "with --denoise: set negative power to 0");
+    command->add_option("--looks", options.looks,
+                        "AxR: mean power of blocks of A lines by R columns");
     command->footer(
-        "Complex channels are written as complex float32 when calibrated, as "
-        "in-phase/quadrature int16 pairs when raw. The file is written as "
-        "OUT.part-XXXXXX beside OUT and renamed when complete.\n"
-        "Example: rs2 export 'dir/product.xml?c=sigma' sigma0.tif");
+        "Samples: complex channels are written as complex float32 when "
+        "calibrated, as in-phase/quadrature int16 pairs when raw; detected "
+        "channels as float32 (calibrated) or int32 (raw).\n"
+        "Backscatter (--db, --denoise, --looks): one float32 value of power "
+        "per channel and pixel. Power is the calibrated value of a detected "
+        "channel, the square of a raw detected one (amplitude), |I+jQ|^2 of "
+        "a complex one. --denoise subtracts, column by column, the noise "
+        "power of the product's referenceNoiseLevel for the chosen "
+        "calibration: its dB levels, given every stepSize columns from "
+        "pixelFirstNoiseValue, interpolated linearly in dB and held at the "
+        "end values beyond them; it needs a calibration. Negative results "
+        "are kept (unbiased means) unless --clamp sets them to 0. --looks "
+        "averages power over A lines by R columns (edge blocks over the "
+        "samples they hold) and scales the georeferencing to match. The "
+        "steps apply in this order: power, noise, looks, dB.\n"
+        "The file is written as OUT.part-XXXXXX beside OUT and renamed when "
+        "complete; nothing is left behind on failure.\n"
+        "Examples:\n"
+        "  rs2 export 'dir/product.xml?c=sigma' sigma0.tif\n"
+        "  rs2 export dir sigma0_db.tif --calibration sigma --denoise --db\n"
+        "  rs2 export dir looked.tif --calibration gamma --looks 4x2 --db");
     command->callback([] { RunExport(options); });
 }

@@ -19,9 +19,12 @@ int main(int argc, char **argv) {
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError &error) {
-        // Help and version are successes; any other parse error is bad usage.
-        int code = app.exit(error);
-        return code == 0 ? 0 : 2;
+        // Help and version are successes; any other parse error is bad
+        // usage, told in one line.
+        if (error.get_exit_code() == 0)
+            return app.exit(error);
+        std::cerr << "rs2: " << error.what() << "\n";
+        return 2;
     } catch (const std::exception &error) {
         std::cerr << "rs2: " << error.what() << "\n";
         return 1;
