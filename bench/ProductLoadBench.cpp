@@ -5,8 +5,9 @@
 // the same validation scheme. See README.md for the figures.
 //
 // The product is the real one in the shared data folder unless
-// RS2_BENCH_PRODUCT names another product.xml.
+// RS2_BENCH_PRODUCT names another product folder.
 
+#include "bench/RealProduct.hpp"
 #include "host/TextServices.hpp"
 #include "host/XmlUtil.hpp"
 #include "model/ProductVariants.hpp"
@@ -32,12 +33,7 @@
 
 namespace {
 
-std::string ProductPath() {
-    const char *path = std::getenv("RS2_BENCH_PRODUCT");
-    return path != nullptr
-               ? path
-               : "/work/shared/realdata/rs2_slc_f0w2_hh_20170430/product.xml";
-}
+std::string ProductPath() { return RealProductFolder() + "/product.xml"; }
 
 bool Exists(const std::string &path) {
     struct stat info;

@@ -21,7 +21,7 @@
 namespace {
 
 const char *const kRealProduct =
-    "/work/shared/realdata/rs2_slc_f0w2_hh_20170430/product.xml";
+    RS2_SOURCE_DIR "/../shared/realdata/rs2_slc_f0w2_hh_20170430/product.xml";
 
 void WriteText(const std::string &path, const std::string &text) {
     std::ofstream out(path);

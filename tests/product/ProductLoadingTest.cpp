@@ -26,7 +26,7 @@ namespace {
 using ModelPtr = std::unique_ptr<ZirOdi2CalibImage>;
 
 const char *const kRealProduct =
-    "/work/shared/realdata/rs2_slc_f0w2_hh_20170430/product.xml";
+    RS2_SOURCE_DIR "/../shared/realdata/rs2_slc_f0w2_hh_20170430/product.xml";
 
 std::string WriteFile(const rs2test::TempDir &dir, const std::string &name,
                       const std::string &text) {

@@ -7,6 +7,10 @@
 void AddDriverCommand(CLI::App &app) {
     CLI::App *command =
         app.add_subcommand("driver", "Show the driver module the host loaded");
+    command->footer("The host looks for the module in VXB_DRIVER_PATH (a file "
+                    "or a folder), then beside its own library, then in the "
+                    "install libdir.\nExample: VXB_DRIVER_PATH=build/lib "
+                    "rs2 driver");
     command->callback([] {
         host::DriverInfo driver = host::LoadedDriver();
         std::printf("driver module: %s\n", driver.path.c_str());

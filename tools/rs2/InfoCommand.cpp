@@ -111,6 +111,11 @@ void AddInfoCommand(CLI::App &app) {
     command->add_option("NAME", name, "dataset name (product.xml, ...)")
         ->required();
     command->add_flag("--json", asJson, "print one JSON object");
+    command->footer(
+        "NAME is product.xml, the product folder, product.xml?c=sigma "
+        "(beta, gamma), product.xml:Calibration Type:Sigma Nought or a "
+        "file:// URI.\nExamples:\n  rs2 info dir\n  rs2 info "
+        "'dir/product.xml?c=sigma' --json");
     command->callback([] {
         host::Raster raster = host::OpenRaster(name);
         nlohmann::json info = DescribeDataset(raster);

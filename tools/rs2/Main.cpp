@@ -10,6 +10,10 @@ int main(int argc, char **argv) {
     CLI::App app{"rs2: inspect, read and export RADARSAT-2 products"};
     app.set_version_flag("--version", std::string("rs2 ") + RS2_VERSION);
     app.require_subcommand(1);
+    app.footer("Run rs2 COMMAND --help for the options and examples of a "
+               "command.\nExamples:\n  rs2 info dir\n  rs2 export dir "
+               "sigma0_db.tif --calibration sigma --denoise --db\n  rs2 "
+               "quicklook dir preview.png");
     AddInfoCommand(app);
     AddReadCommand(app);
     AddExportCommand(app);

@@ -95,5 +95,9 @@ void AddReadCommand(CLI::App &app) {
         ->excludes(real);
     command->add_flag("--json", options.json,
                       "print {type, width, height, channels, data}");
+    command->footer("Prints one line per row, or with --json the buffer as "
+                    "the driver wrote it.\nExamples:\n  rs2 read dir --window "
+                    "0 0 4 3\n  rs2 read 'dir?c=sigma' --window 0 0 800 600 "
+                    "--size 8 6 --json");
     command->callback([] { RunRead(options); });
 }

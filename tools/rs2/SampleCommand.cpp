@@ -75,6 +75,9 @@ void AddSampleCommand(CLI::App &app) {
     CLI::App *sample = app.add_subcommand(
         "sample", "Write a synthetic product folder (product.xml, look-up "
                   "tables, GeoTIFFs) and print the path of its product.xml");
+    sample->footer("Examples:\n  rs2 sample /tmp/sgf --type SGF --pols HH,HV "
+                   "--size 800x600\n  rs2 sample /tmp/slc --type SLC --pols "
+                   "HH,HV,VH,VV --seed 3");
     sample->add_option("DIR", arguments->directory, "Product folder to write")
         ->required();
     sample->add_option("--type", options.productType, "Product type")

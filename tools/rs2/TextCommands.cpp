@@ -9,6 +9,7 @@ void AddTextCommands(CLI::App &app) {
     CLI::App *text = app.add_subcommand(
         "text", "Print the product annotation segment line by line");
     text->add_option("NAME", textName, "dataset name")->required();
+    text->footer("Example: rs2 text dir/product.xml | grep noiseLevelValues");
     text->callback([] {
         host::Raster raster = host::OpenRaster(textName);
         for (const std::string &line : raster.TextLines())
@@ -19,6 +20,8 @@ void AddTextCommands(CLI::App &app) {
     CLI::App *segments =
         app.add_subcommand("segments", "List the segments of a dataset");
     segments->add_option("NAME", segmentsName, "dataset name")->required();
+    segments->footer("Prints one line per segment: type, number, "
+                     "description.\nExample: rs2 segments dir");
     segments->callback([] {
         host::Raster raster = host::OpenRaster(segmentsName);
         for (const host::Segment &segment : raster.Segments())
