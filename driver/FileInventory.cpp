@@ -7,13 +7,14 @@
 #include "host/XmlUtil.hpp"
 #include "host/fileio/DataSourceFactory.hpp"
 #include "host/fileio/URI.hpp"
+#include "product/DescriptionFacts.hpp"
 #include "product/DocumentAccess.hpp"
 
-#include <xercesc/dom/DOMElement.hpp>
-#include <xercesc/dom/DOMNamedNodeMap.hpp>
-#include <xercesc/dom/DOMNodeList.hpp>
 
 #include <memory>
+#include <optional>
+#include <string>
+#include <vector>
 
 using orv::core::fileio::DataSource;
 using orv::core::fileio::DataSourceFactory;
@@ -50,22 +51,16 @@ char **AddIfPresent(char **list, const std::string &path) {
     return DKCheck(path.c_str()) ? AddStringToList(list, path.c_str()) : list;
 }
 
-// Adds one entry for each attribute of each image element, as the product
-// description lists them.
-char **AddImageEntries(char **list, const xercesc::DOMDocument &document,
-                       const std::string &directory) {
-    XmlTranscode tag("fullResolutionImageData");
-    xercesc::DOMNodeList *elements = document.getElementsByTagName(tag);
-    for (XMLSize_t i = 0; elements && i < elements->getLength(); ++i) {
-        const xercesc::DOMNode *element = elements->item(i);
-        std::string text = NodeText(element);
-        const xercesc::DOMNamedNodeMap *attributes = element->getAttributes();
-        for (XMLSize_t a = 0; attributes && a < attributes->getLength(); ++a) {
-            std::unique_ptr<char, decltype(&std::free)> entry(
-                HString(MkName("%s//%s", directory.c_str(), text.c_str())),
-                &std::free);
-            list = AddStringToList(list, entry.get());
-        }
+// One entry per image element attribute: the image's name under the
+// product folder.
+char **ImageEntryList(const std::vector<std::string> &entries,
+                      const std::string &directory) {
+    char **list = nullptr;
+    for (const std::string &text : entries) {
+        std::unique_ptr<char, decltype(&std::free)> entry(
+            HString(MkName("%s//%s", directory.c_str(), text.c_str())),
+            &std::free);
+        list = AddStringToList(list, entry.get());
     }
     return list;
 }
@@ -91,8 +86,14 @@ std::string BrowseImageFile(FILE *handle) {
 
 char **ListImageFiles(FILE *handle) {
     File file = ParseFileName(HandleName(handle));
-    DocumentParse parse(file.GetNormalizedName().c_str());
-    if (parse.Document() == nullptr)
-        return nullptr;
-    return AddImageEntries(nullptr, *parse.Document(), file.GetPath());
+    const std::string description = file.GetNormalizedName();
+    std::optional<DescriptionFacts> facts =
+        RecalledDescriptionFacts(description.c_str());
+    if (!facts) {
+        DocumentParse parse(description.c_str());
+        if (parse.Document() == nullptr)
+            return nullptr;
+        facts = FactsOfDescription(parse.Document());
+    }
+    return ImageEntryList(facts->imageEntries, file.GetPath());
 }

@@ -4,6 +4,7 @@
 #include <proj.h>
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <cstdio>
 #include <cstdlib>
@@ -108,7 +109,7 @@ using TransformOwner = std::unique_ptr<PJ, TransformDeleter>;
 
 // The EPSG name of a coordinate system PROJ can carry, or "" for the systems
 // without a ground meaning (PIXEL, METER) and unknown texts.
-std::string EpsgName(const char *geosys) {
+std::string DecodedEpsgName(const char *geosys) {
     char normalised[kGeosysTextSize];
     const int32_t code = DecodeGeosys(geosys, normalised);
     if (code == kGeosysLong)
@@ -119,6 +120,26 @@ std::string EpsgName(const char *geosys) {
         return "EPSG:" + std::to_string(base + utm.zone);
     }
     return "";
+}
+
+// The same, remembered for the last two texts of this thread: a caller
+// transforms point after point between the same two systems, and decoding
+// the texts costs more than transforming a point.
+std::string EpsgName(const char *geosys) {
+    struct Decoded {
+        std::string text;
+        std::string name;
+    };
+    thread_local std::array<Decoded, 2> recent;
+    thread_local size_t next = 0;
+    const char *text = geosys != nullptr ? geosys : "";
+    for (const Decoded &entry : recent)
+        if (!entry.name.empty() && entry.text == text)
+            return entry.name;
+    Decoded &entry = recent[next];
+    next = (next + 1) % recent.size();
+    entry = {text, DecodedEpsgName(geosys)};
+    return entry.name;
 }
 
 // The transformations between pairs of systems, built once per thread in a

@@ -4,7 +4,9 @@
 // column.
 
 #include "product/CalibrationTables.hpp"
+
 #include "host/HostMemory.hpp"
+#include "product/DescriptionFacts.hpp"
 
 #include "host/ErrorReports.hpp"
 #include "host/StringLists.hpp"
@@ -158,14 +160,6 @@ bool IsSigmaNought(const std::string &value) {
     return strcasecmp(value.c_str(), kDefaultKind) == 0;
 }
 
-// Appends ":Calibration Type:" + kind to the list, which it replaces.
-void AddCalibrationType(HostList &list, const std::string &kind) {
-    const std::string entry = kCalibrationTypePrefix + kind;
-    list.reset(AddStringToList(list.release(), entry.c_str()));
-}
-
-// The attribute values of every lookupTable element, elements in document
-// order, attributes in attribute-map order.
 std::vector<std::string>
 LookupTableAttributes(const xercesc::DOMDocument *document) {
     std::vector<std::string> values;
@@ -181,22 +175,33 @@ LookupTableAttributes(const xercesc::DOMDocument *document) {
     return values;
 }
 
-char **CalibrationTypeList(const xercesc::DOMDocument *document) {
-    const std::vector<std::string> kinds = LookupTableAttributes(document);
+// The list of calibration types, each entry ":Calibration Type:" + kind.
+char **CalibrationTypeList(const std::vector<std::string> &kinds) {
     HostList list;
-    bool hasSigmaNought = false;
-    for (const std::string &kind : kinds)
-        hasSigmaNought = hasSigmaNought || IsSigmaNought(kind);
-    if (hasSigmaNought)
-        AddCalibrationType(list, kDefaultKind);
-    for (const std::string &kind : kinds)
-        if (!IsSigmaNought(kind))
-            AddCalibrationType(list, kind);
-    AddCalibrationType(list, kNoCalibration);
+    for (const std::string &kind : kinds) {
+        const std::string entry = kCalibrationTypePrefix + kind;
+        list.reset(AddStringToList(list.release(), entry.c_str()));
+    }
     return list.release();
 }
 
 } // namespace
+
+std::vector<std::string>
+CalibrationTypeNames(const xercesc::DOMDocument *document) {
+    const std::vector<std::string> kinds = LookupTableAttributes(document);
+    std::vector<std::string> names;
+    bool hasSigmaNought = false;
+    for (const std::string &kind : kinds)
+        hasSigmaNought = hasSigmaNought || IsSigmaNought(kind);
+    if (hasSigmaNought)
+        names.push_back(kDefaultKind);
+    for (const std::string &kind : kinds)
+        if (!IsSigmaNought(kind))
+            names.push_back(kind);
+    names.push_back(kNoCalibration);
+    return names;
+}
 
 char *FindLookupTableFile(const xercesc::DOMDocument *document,
                           const ZirOdi2CalibImage *model, const char *pattern) {
@@ -294,10 +299,12 @@ char **ListCalibrationTypes(const char *path) {
     if (path == nullptr)
         return nullptr;
     // A table operation of the driver: nothing but host reports may leave.
+    if (std::optional<DescriptionFacts> facts = RecalledDescriptionFacts(path))
+        return CalibrationTypeList(facts->calibrationTypes);
     return UnlessParseFails<char **>([path]() -> char ** {
         DocumentParse parse(path);
         if (parse.Document() == nullptr)
             return nullptr;
-        return CalibrationTypeList(parse.Document());
+        return CalibrationTypeList(CalibrationTypeNames(parse.Document()));
     });
 }

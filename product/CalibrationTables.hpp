@@ -58,3 +58,9 @@ void ReadIncidenceAngles(const xercesc::DOMDocument *document,
 /// offers, "None" last; a new host list, or null when path yields no
 /// document.
 char **ListCalibrationTypes(const char *path);
+
+/// The calibration types a description offers, in the order the list of
+/// ListCalibrationTypes gives them: "Sigma Nought" first when a table of
+/// that kind is listed, the other kinds in document order, "None" last.
+std::vector<std::string>
+CalibrationTypeNames(const xercesc::DOMDocument *document);

@@ -1,5 +1,7 @@
 #include "product/ProductLoading.hpp"
 
+#include "product/DescriptionFacts.hpp"
+
 #include "host/ErrorReports.hpp"
 #include "host/Exception.hpp"
 #include "host/TextServices.hpp"
@@ -163,6 +165,7 @@ LoadDescription(ProductReader &reader, const char *path, const char *option) {
     std::unique_ptr<ZirOdi2CalibImage> model(row->make());
     FillModel(reader, document, *model, *row, productType, acquisitionType,
               path, option);
+    RememberDescriptionFacts(path, FactsOfDescription(document));
     return model;
 }
 
