@@ -20,11 +20,14 @@ test: build
 
 demo: build
 	$(RS2) --version
-	$(RS2) driver
 	$(RS2) info $(SAMPLE)
 	mkdir -p $(BUILD)/demo
-	$(RS2) export '$(SAMPLE)?c=sigma' $(BUILD)/demo/sigma0.tif
-	@echo "Sigma Nought GeoTIFF of the sample product: $(BUILD)/demo/sigma0.tif"
+	$(RS2) export $(SAMPLE) $(BUILD)/demo/sigma0_db.tif --calibration sigma --denoise --db
+	$(RS2) quicklook $(SAMPLE) $(BUILD)/demo/quicklook.png --calibration sigma
+	@echo
+	@echo "The sample product: $(SAMPLE)"
+	@echo "  Sigma Nought in dB, noise removed, georeferenced GeoTIFF: $(BUILD)/demo/sigma0_db.tif"
+	@echo "  colour quicklook (HH, HV, HH): $(BUILD)/demo/quicklook.png"
 
 sanitize: deps
 	cmake -S . -B $(BUILD)-asan -DCMAKE_BUILD_TYPE=Debug -DSANITIZE=address,undefined -DRS2_BUILD_BENCHMARKS=OFF

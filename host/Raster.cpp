@@ -123,15 +123,21 @@ std::string ProductFolderResolved(const std::string &name) {
     return product + name.substr(end);
 }
 
-bool IsComplexReal(int32_t typeCode) { return typeCode == kChanComplexFloat32; }
+// A real read gives two floats, in-phase and quadrature, for every sample
+// of a complex channel, integer or float.
+bool IsComplex(int32_t typeCode) {
+    return typeCode == kChanComplexFloat32 || typeCode == kChanComplexInt16;
+}
 
-// Floats a real read writes: two per sample of complex channels. Zero for a
+// Floats a real read writes: two per sample when any channel is complex, so
+// that the buffer holds the read whatever the mix of channels. Zero for a
 // request the host refuses, which then reports why.
 size_t RealValueCount(const Raster &raster, int32_t bufferWidth,
                       int32_t bufferHeight,
                       const std::vector<int32_t> &channels) {
-    const bool complex =
-        !channels.empty() && IsComplexReal(raster.ChannelType(channels[0]));
+    bool complex = false;
+    for (int32_t channel : channels)
+        complex = complex || IsComplex(raster.ChannelType(channel));
     return BufferSize<float>(bufferWidth, bufferHeight, channels.size(),
                              complex ? 2 : 1);
 }

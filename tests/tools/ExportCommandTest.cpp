@@ -463,4 +463,11 @@ TEST(RasterBandReads, need_room_for_the_whole_read) {
                  host::Error);
     raw.ReadInt32Into(window, 4, 3, channels, words.data(), 24);
     EXPECT_EQ(words, raw.ReadInt32(window, 4, 3, channels));
+    // Raw complex samples read as reals are in-phase/quadrature pairs as
+    // well: the buffer must hold two floats a sample.
+    const std::vector<float> pairs = raw.ReadReal32(window, 4, 3, channels);
+    ASSERT_EQ(pairs.size(), 48u);
+    const auto [i, q] = rs2gen::ComplexSample(slc.options, 1, 1, 1);
+    EXPECT_EQ(pairs[2], i);
+    EXPECT_EQ(pairs[3], q);
 }

@@ -11,3 +11,4 @@ void AddExportCommand(CLI::App &app);
 void AddTextCommands(CLI::App &app);
 void AddDriverCommand(CLI::App &app);
 void AddSampleCommand(CLI::App &app);
+void AddQuicklookCommand(CLI::App &app);

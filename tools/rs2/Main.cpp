@@ -20,6 +20,7 @@ int main(int argc, char **argv) {
     AddTextCommands(app);
     AddDriverCommand(app);
     AddSampleCommand(app);
+    AddQuicklookCommand(app);
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError &error) {
