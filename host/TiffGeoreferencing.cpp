@@ -132,6 +132,15 @@ void MoveToPixelCorner(AffineTransform &transform) {
     transform[3] -= 0.5 * (transform[4] + transform[5]);
 }
 
+// "UTM <zone> <band> D000". Zones of the keys run 1-60, so the text fits a
+// host coordinate-system text; the buffer still takes any int, so that no
+// zone can cut the text short.
+std::string UtmGeosys(int zone, char band) {
+    char text[sizeof "UTM -2147483648 X D000"];
+    std::snprintf(text, sizeof text, "UTM %d %c D000", zone, band);
+    return text;
+}
+
 bool IsUtmBandLetter(char band) {
     return band >= 'C' && band <= 'X' && band != 'I' && band != 'O';
 }
@@ -144,13 +153,11 @@ char UtmBand(const KeySystem &system, const std::optional<ModelPoint> &point) {
     const char hemisphereBand = system.north ? 'N' : 'M';
     if (!point)
         return hemisphereBand;
-    char source[kGeosysTextSize];
-    std::snprintf(source, sizeof source, "UTM %d %c D000", system.zone,
-                  hemisphereBand);
+    const std::string source = UtmGeosys(system.zone, hemisphereBand);
     double longitude = 0.0;
     double latitude = 0.0;
-    if (GCTPSimpleTransform(source, (*point)[0], (*point)[1], "LONG D000",
-                            &longitude, &latitude) != 0)
+    if (GCTPSimpleTransform(source.c_str(), (*point)[0], (*point)[1],
+                            "LONG D000", &longitude, &latitude) != 0)
         return hemisphereBand;
     int32_t zone = 0;
     char band = '\0';
@@ -187,12 +194,8 @@ std::string GeosysText(const KeySystem &system,
     switch (system.kind) {
     case KeySystem::Kind::Geographic:
         return "LONG D000";
-    case KeySystem::Kind::Utm: {
-        char text[kGeosysTextSize];
-        std::snprintf(text, sizeof text, "UTM %d %c D000", system.zone,
-                      UtmBand(system, centre));
-        return text;
-    }
+    case KeySystem::Kind::Utm:
+        return UtmGeosys(system.zone, UtmBand(system, centre));
     default:
         return "PIXEL";
     }
