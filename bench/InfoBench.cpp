@@ -14,6 +14,7 @@
 
 #include <xercesc/parsers/XercesDOMParser.hpp>
 
+#include <chrono>
 #include <string>
 #include <sys/stat.h>
 
@@ -75,6 +76,49 @@ void BM_OpenAndDescribe(benchmark::State &state) {
         OpenAndDescribe(folder);
 }
 BENCHMARK(BM_OpenAndDescribe)->Unit(benchmark::kMillisecond);
+
+void BM_OpenOnly(benchmark::State &state) {
+    const std::string folder = RealProductFolder();
+    if (!Exists(folder + "/product.xml"))
+        return state.SkipWithError("the real product is not there");
+    PlatformHold platform;
+    for (auto _ : state) {
+        const host::Raster raster = host::OpenRaster(folder + "/product.xml");
+        benchmark::DoNotOptimize(raster.Width());
+    }
+}
+BENCHMARK(BM_OpenOnly)->Unit(benchmark::kMillisecond);
+
+double MillisecondsOf(void (*work)(const std::string &),
+                      const std::string &folder) {
+    const auto start = std::chrono::steady_clock::now();
+    work(folder);
+    return std::chrono::duration<double, std::milli>(
+               std::chrono::steady_clock::now() - start)
+        .count();
+}
+
+// Both sides in every iteration, so that they meet the same machine: the
+// counters are their mean times and the mean of their ratios.
+void BM_InfoOverBareParse(benchmark::State &state) {
+    const std::string folder = RealProductFolder();
+    if (!Exists(folder + "/product.xml"))
+        return state.SkipWithError("the real product is not there");
+    PlatformHold platform;
+    double parse = 0, info = 0, ratio = 0;
+    for (auto _ : state) {
+        const double parseMs = MillisecondsOf(ParseBareWithTables, folder);
+        const double infoMs = MillisecondsOf(OpenAndDescribe, folder);
+        parse += parseMs;
+        info += infoMs;
+        ratio += infoMs / parseMs;
+    }
+    using Counter = benchmark::Counter;
+    state.counters["parse_ms"] = Counter(parse, Counter::kAvgIterations);
+    state.counters["info_ms"] = Counter(info, Counter::kAvgIterations);
+    state.counters["ratio"] = Counter(ratio, Counter::kAvgIterations);
+}
+BENCHMARK(BM_InfoOverBareParse)->Unit(benchmark::kMillisecond);
 
 } // namespace
 
