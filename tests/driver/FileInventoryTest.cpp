@@ -1,31 +1,23 @@
 #include "driver/FileInventory.hpp"
+#include "host/HostMemory.hpp"
 #include "host/RasterServices.hpp"
-#include "host/StringLists.hpp"
+#include "tests/support/HostLists.hpp"
 #include "tests/support/TempDir.hpp"
+#include "tests/support/TestFiles.hpp"
 
 #include <gtest/gtest.h>
 
-#include <fstream>
-#include <memory>
 #include <string>
 #include <vector>
 
 namespace {
 
-struct ListDeleter {
-    void operator()(char **list) const { DestroyStringList(list); }
-};
-
 std::vector<std::string> Texts(char **list) {
-    std::unique_ptr<char *, ListDeleter> keeper(list);
-    std::vector<std::string> texts;
-    for (char **entry = list; entry && *entry; ++entry)
-        texts.emplace_back(*entry);
-    return texts;
+    return rs2test::ListTexts(host::HostList(list).get());
 }
 
 void Touch(const std::string &path, const std::string &text = "x") {
-    std::ofstream(path) << text;
+    rs2test::WriteFile(path, text);
 }
 
 // A host handle named like an open dataset; the file lists need only its name.

@@ -95,9 +95,9 @@ TEST(TextSegment, open_sets_up_the_cursor_and_refuses_other_access) {
     std::memset(&cursor, 0x5A, sizeof cursor);
     const int64_t hostData = cursor.hostData;
     EXPECT_EQ(OpenTextSegment(kUnknownHandle, &cursor, "r", 42), 0);
-    EXPECT_EQ(cursor.status, 0);
     EXPECT_EQ(cursor.handle, kUnknownHandle);
     EXPECT_EQ(cursor.value, 42);
+    EXPECT_EQ(cursor.status, 0);
     EXPECT_EQ(cursor.position, 0);
     EXPECT_EQ(cursor.lineIndex, 0);
     EXPECT_EQ(cursor.hostData, hostData);
@@ -193,20 +193,15 @@ TEST(TextSegment, cursors_of_two_datasets_each_get_their_own_lines) {
     TextCursor a = OpenCursor(first.handle.get());
     TextCursor b = OpenCursor(second.handle.get());
     std::vector<std::string> fromFirst, fromSecond;
-    bool moreA = true, moreB = true;
-    while (moreA || moreB) {
-        if (moreA) {
-            std::optional<std::string> line = NextLine(a);
-            moreA = line.has_value();
-            if (moreA)
-                fromFirst.push_back(*line);
-        }
-        if (moreB) {
-            std::optional<std::string> line = NextLine(b);
-            moreB = line.has_value();
-            if (moreB)
-                fromSecond.push_back(*line);
-        }
+    auto take = [](TextCursor &cursor, std::vector<std::string> &lines) {
+        std::optional<std::string> line = NextLine(cursor);
+        if (line)
+            lines.push_back(*line);
+        return line.has_value();
+    };
+    for (bool moreA = true, moreB = true; moreA || moreB;) {
+        moreA = moreA && take(a, fromFirst);
+        moreB = moreB && take(b, fromSecond);
     }
     EXPECT_EQ(fromFirst, first.lines);
     EXPECT_EQ(fromSecond, second.lines);

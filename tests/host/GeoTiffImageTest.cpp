@@ -2,7 +2,9 @@
 #include "host/ErrorReports.hpp"
 #include "host/ModelSegments.hpp"
 #include "host/RasterServices.hpp"
+#include "tests/support/CommandRun.hpp"
 #include "tests/support/TempDir.hpp"
+#include "tests/support/TestFiles.hpp"
 #include "tests/support/TiffWriter.hpp"
 
 #include <gtest/gtest.h>
@@ -13,7 +15,6 @@
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
-#include <iterator>
 #include <limits>
 #include <memory>
 #include <sstream>
@@ -311,10 +312,6 @@ TEST(GeoTiffImage, refuses_bad_requests_without_writing) {
                  ReportedError);
 }
 
-void WriteText(const std::string &path, const std::string &text) {
-    std::ofstream(path, std::ios::binary) << text;
-}
-
 TEST(GeoTiffImage, refuses_files_it_cannot_decode) {
     struct Case {
         const char *what;
@@ -350,7 +347,7 @@ TEST(GeoTiffImage, refuses_files_it_cannot_decode) {
     // No TIFF signature: text, no bytes at all.
     for (const char *text : {"this is not an image\n", ""}) {
         const std::string path = dir.File("notes.tif");
-        WriteText(path, text);
+        rs2test::WriteFile(path, text);
         EXPECT_FALSE(host::HasTiffSignature(path));
         EXPECT_THROW(GeoTiffImage::Open(path), ReportedError);
     }
@@ -396,13 +393,12 @@ TEST(GeoTiffImage, missing_uncompressed_strip_is_refused_before_writing) {
     // Point the second strip at the end of the file: its data is missing.
     const auto strips = rs2test::StoredBlocks(path);
     ASSERT_EQ(strips.size(), 2u);
-    std::ifstream in(path, std::ios::binary);
-    std::string bytes{std::istreambuf_iterator<char>(in), {}};
+    std::string bytes = rs2test::FileText(path);
     const size_t offsets = bytes.find(LittleEndian32(strips[0].first) +
                                       LittleEndian32(strips[1].first));
     ASSERT_NE(offsets, std::string::npos);
     bytes.replace(offsets + 4, 4, LittleEndian32(bytes.size()));
-    WriteText(path, bytes);
+    rs2test::WriteFile(path, bytes);
     std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
     ExpectWindow(*image, value, ExpectedInt, {0, 0, 10, 4, 10, 4}, {1});
     ExpectReadFailsWritingNothing(*image, {0, 0, 10, 8, 10, 8}, {1});

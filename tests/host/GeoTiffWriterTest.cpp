@@ -79,14 +79,15 @@ TEST(GeoTiffWriter, sample_types_have_their_tiff_layout_and_round_trip) {
         uint16_t bits, format, samples;
         size_t pixelBytes;
     };
+    // clang-format off
     const Case cases[] = {
         {host::SampleType::Float32, 1, 32, SAMPLEFORMAT_IEEEFP, 1, 4},
         {host::SampleType::Float32, 3, 32, SAMPLEFORMAT_IEEEFP, 3, 12},
-        {host::SampleType::ComplexFloat32, 2, 64, SAMPLEFORMAT_COMPLEXIEEEFP, 2,
-         16},
+        {host::SampleType::ComplexFloat32, 2, 64, SAMPLEFORMAT_COMPLEXIEEEFP, 2, 16},
         {host::SampleType::Int32, 2, 32, SAMPLEFORMAT_INT, 2, 8},
         {host::SampleType::ComplexInt16, 2, 16, SAMPLEFORMAT_INT, 4, 8},
     };
+    // clang-format on
     rs2test::TempDir folder;
     // Strips of 5 to 21 rows for these pixel sizes, the last one short.
     const int32_t width = 3001;
@@ -260,36 +261,23 @@ TEST(GeoTiffWriter, writes_utm_and_geographic_georeferencing_as_pixel_is_area) {
         int modelType, projected, geographic;
         std::vector<double> matrix, scale, ties;
     };
+    // The 4 x 4 model transformation, row by row.
+    const std::vector<double> rotatedMatrix = {
+        11.5, -2.0, 0, 500000.0, -1.5, -12.5, 0, 5450000.0,
+        0,    0,    0, 0,        0,    0,     0, 1};
+    // clang-format off
     const Case cases[] = {
         // A rotated grid needs the matrix; its tie points follow it.
-        {{"UTM 10 U D000",
-          true,
-          rotated,
-          {{0.5, 0.5, 500010.0, 5449990.0, 3.0}}},
-         ModelTypeProjected,
-         32610,
-         -1,
-         {11.5, -2.0, 0, 500000.0, -1.5, -12.5, 0, 5450000.0, 0, 0, 0, 0, 0, 0,
-          0, 1},
-         {},
-         {0.5, 0.5, 0, 500010.0, 5449990.0, 3.0}},
+        {{"UTM 10 U D000", true, rotated, {{0.5, 0.5, 500010.0, 5449990.0, 3.0}}},
+         ModelTypeProjected, 32610, -1, rotatedMatrix, {}, {0.5, 0.5, 0, 500010.0, 5449990.0, 3.0}},
         // A north-up grid in the south: scale and one tie point.
         {{"UTM 33 H D000", true, northUp, {}},
-         ModelTypeProjected,
-         32733,
-         -1,
-         {},
-         {10.0, 10.0, 0.0},
-         {0, 0, 0, 300000.0, 7000000.0, 0}},
+         ModelTypeProjected, 32733, -1, {}, {10.0, 10.0, 0.0}, {0, 0, 0, 300000.0, 7000000.0, 0}},
         // Tie points alone, in WGS 84 longitude and latitude.
         {{"LONG D000", false, {}, {tie}},
-         ModelTypeGeographic,
-         -1,
-         GCS_WGS_84,
-         {},
-         {},
-         {0.5, 0.5, 0, -123.25, 49.5, 12.0}},
+         ModelTypeGeographic, -1, GCS_WGS_84, {}, {}, {0.5, 0.5, 0, -123.25, 49.5, 12.0}},
     };
+    // clang-format on
     rs2test::TempDir folder;
     for (const Case &c : cases) {
         const WrittenGeoreferencing written =

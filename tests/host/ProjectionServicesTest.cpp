@@ -1,19 +1,16 @@
 #include "host/ProjectionServices.hpp"
 
+#include "host/HostMemory.hpp"
+
 #include <gtest/gtest.h>
 
 #include <cmath>
-#include <cstdlib>
 #include <cstring>
 #include <memory>
 #include <string>
 #include <vector>
 
 namespace {
-
-struct FreeDeleter {
-    void operator()(void *memory) const { std::free(memory); }
-};
 
 constexpr double kPi = 3.14159265358979323846;
 
@@ -282,7 +279,7 @@ TEST(ProjInfo2Parms, round_trips_every_parameter_and_reads_missing_as_zero) {
     for (int i = 0; i < kProjParmCount; ++i)
         source.parms[i] = (i % 2 ? -1.0 : 1.0) / (i + 3.0) * std::pow(10.0, i);
     source.parms[5] = 1e-300;
-    std::unique_ptr<char, FreeDeleter> text(ProjInfo2Parms(&source));
+    host::HostText text(ProjInfo2Parms(&source));
     ASSERT_NE(text, nullptr);
     ProjInfo_t copy;
     InitProjInfo(&copy, 0);

@@ -1,5 +1,4 @@
 #include "host/ErrorReports.hpp"
-#include "host/Exception.hpp"
 #include "host/StringLists.hpp"
 #include "host/TextServices.hpp"
 #include "host/XmlUtil.hpp"
@@ -225,15 +224,6 @@ TEST(ErrorReports, warnings_are_logged_and_the_call_returns) {
         (std::vector<std::string>{"No Sigma Nought table", "missing: (null)"}));
     host::ClearWarnings();
     EXPECT_TRUE(host::Warnings().empty());
-}
-
-TEST(Exceptions, data_exception_is_caught_as_a_host_exception) {
-    try {
-        throw orv::DataException("No SatPositions", "", "", 4);
-    } catch (const orv::Exception &error) {
-        EXPECT_STREQ(error.what(), "No SatPositions");
-        EXPECT_EQ(error.Number(), 4);
-    }
 }
 
 namespace {

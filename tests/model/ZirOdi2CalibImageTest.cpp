@@ -1,18 +1,19 @@
 #include "model/ZirOdi2CalibImage.hpp"
 
 #include "host/ErrorReports.hpp"
+#include "host/HostMemory.hpp"
 #include "host/RasterServices.hpp"
 #include "host/StringLists.hpp"
 #include "model/ProductVariants.hpp"
+#include "tests/support/CommandRun.hpp"
 #include "tests/support/TempDir.hpp"
+#include "tests/support/TestFiles.hpp"
 #include "tools/generator/ProductGenerator.hpp"
 
 #include <gtest/gtest.h>
 
 #include <algorithm>
 #include <cstdlib>
-#include <fstream>
-#include <iterator>
 #include <memory>
 #include <string>
 #include <vector>
@@ -23,10 +24,7 @@ constexpr int32_t kHH = static_cast<int32_t>(Polarization::HH);
 constexpr int32_t kHV = static_cast<int32_t>(Polarization::HV);
 constexpr int32_t kVV = static_cast<int32_t>(Polarization::VV);
 
-struct ListDeleter {
-    void operator()(char **list) const { DestroyStringList(list); }
-};
-using HostList = std::unique_ptr<char *, ListDeleter>;
+using host::HostList;
 
 // Counts how often the channel table is built.
 class CountingProduct : public RUZ2GrpC2R {
@@ -215,15 +213,11 @@ TEST_F(ImageFiles, refuses_an_image_file_that_leads_back_to_its_product) {
     // open the product, whose image opens the product again, without end.
     if (std::getenv("VXB_DRIVER_PATH") == nullptr)
         setenv("VXB_DRIVER_PATH", RS2_DRIVER_MODULE, 1);
-    std::string text;
-    {
-        std::ifstream in(product.productXml);
-        text.assign(std::istreambuf_iterator<char>(in), {});
-    }
-    std::string image = ">" + rs2gen::ImageFileName("HH") + "<";
+    std::string text = rs2test::FileText(product.productXml);
+    const std::string image = ">" + rs2gen::ImageFileName("HH") + "<";
     ASSERT_NE(text.find(image), std::string::npos);
     text.replace(text.find(image), image.size(), ">product.xml<");
-    std::ofstream(product.productXml, std::ios::trunc) << text;
+    rs2test::WriteFile(product.productXml, text);
     RUZ2GrpcCR model;
     model.SetProductDirectory(product.productXml.c_str());
     model.AddBand(kHH, "product.xml");

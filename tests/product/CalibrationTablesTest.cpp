@@ -1,40 +1,30 @@
 #include "product/CalibrationTables.hpp"
 
 #include "host/ErrorReports.hpp"
-#include "host/StringLists.hpp"
+#include "host/HostMemory.hpp"
 #include "model/LookupTable.hpp"
 #include "model/ProductVariants.hpp"
 #include "product/DocumentAccess.hpp"
+#include "tests/support/HostLists.hpp"
 #include "tests/support/TempDir.hpp"
+#include "tests/support/TestFiles.hpp"
 #include "tools/generator/ProductGenerator.hpp"
 
 #include <gtest/gtest.h>
 
 #include <cstdio>
-#include <cstdlib>
-#include <fstream>
 #include <memory>
 #include <string>
 #include <vector>
 
 namespace {
 
-struct FreeDeleter {
-    void operator()(void *memory) const { std::free(memory); }
-};
-using HostText = std::unique_ptr<char, FreeDeleter>;
-
-struct StringListDeleter {
-    void operator()(char **list) const { DestroyStringList(list); }
-};
+using host::HostText;
+using rs2test::WriteFile;
 
 const char kNoNameWarning[] =
     "The LUT file name can not be found in product.xml file.\n"
     "The image will be loaded without calibration";
-
-void WriteText(const std::string &path, const std::string &text) {
-    std::ofstream(path) << text;
-}
 
 // A product description that only names look-up tables; each entry is the
 // attribute list and the file name of one lookupTable element.
@@ -48,11 +38,7 @@ std::string DescriptionNaming(
 }
 
 std::vector<std::string> Entries(char **list) {
-    const std::unique_ptr<char *, StringListDeleter> owner(list);
-    std::vector<std::string> entries;
-    for (char **entry = list; entry != nullptr && *entry != nullptr; ++entry)
-        entries.emplace_back(*entry);
-    return entries;
+    return rs2test::ListTexts(host::HostList(list).get());
 }
 
 // A model whose product directory is the folder of productXml, as loading
@@ -86,14 +72,22 @@ TEST(CalibrationTables, look_up_table_file_packs_the_numbers_it_can_read) {
         {"<lut><offset>abc</offset><gains>1.5e2abc  -3</gains></lut>",
          0.0f,
          {150, -3, 0}},
-        // Leading white space inside a token is skipped.
+        // Leading white space inside a token is skipped; only spaces split.
         {"<lut><offset>-7.25</offset><gains>\t4 5</gains></lut>",
          -7.25f,
          {4, 5}},
+        {"<lut><offset>0</offset><gains>1\t2 \n3 4\n</gains></lut>",
+         0.0f,
+         {1, 3, 4}},
+        // Words, hexadecimal and out-of-range texts read as a stream reads
+        // them.
+        {"<lut><offset>0</offset><gains>inf 0x10 1e400 7</gains></lut>",
+         0.0f,
+         {0, 7, 0, 0}},
     };
     rs2test::TempDir dir;
     for (const Case &c : cases) {
-        WriteText(dir.File("lut.xml"), c.file);
+        WriteFile(dir.File("lut.xml"), c.file);
         const std::unique_ptr<LookupTable> table =
             ReadLookupTableFile(dir.File("lut.xml").c_str());
         ASSERT_NE(table, nullptr) << c.file;
@@ -119,7 +113,7 @@ TEST(CalibrationTables, look_up_table_file_without_document_gives_no_table) {
         "<lut><offset>1</offset></lut>",
     };
     for (const char *file : unreadable) {
-        WriteText(dir.File("lut.xml"), file);
+        WriteFile(dir.File("lut.xml"), file);
         EXPECT_EQ(ReadLookupTableFile(dir.File("lut.xml").c_str()), nullptr)
             << file;
     }
@@ -161,10 +155,10 @@ TEST(CalibrationTables, option_selects_table_of_its_kind) {
 
 TEST(CalibrationTables, kind_is_recorded_as_the_description_writes_it) {
     rs2test::TempDir dir;
-    WriteText(dir.File("product.xml"),
+    WriteFile(dir.File("product.xml"),
               DescriptionNaming({{"a=\"GAMMA\"", "lutGamma.xml"},
                                  {"a=\"SIGMA NOUGHT\"", "lutSigma.xml"}}));
-    WriteText(dir.File("lutSigma.xml"),
+    WriteFile(dir.File("lutSigma.xml"),
               "<lut><offset>0</offset><gains>7 8</gains></lut>");
     DocumentParse parse(dir.File("product.xml").c_str());
     auto model = ModelFor(dir.File("product.xml"));
@@ -205,10 +199,10 @@ TEST(CalibrationTables, missing_table_loads_without_calibration_and_warns) {
          "<lut><offset>0</offset></lut>", unreadable},
     };
     for (const Case &c : cases) {
-        WriteText(dir.File("product.xml"), c.description);
+        WriteFile(dir.File("product.xml"), c.description);
         std::remove(dir.File("lutSigma.xml").c_str());
         if (c.table != nullptr)
-            WriteText(dir.File("lutSigma.xml"), c.table);
+            WriteFile(dir.File("lutSigma.xml"), c.table);
         DocumentParse parse(dir.File("product.xml").c_str());
         ASSERT_NE(parse.Document(), nullptr) << c.what;
         auto model = ModelFor(dir.File("product.xml"));
@@ -224,7 +218,7 @@ TEST(CalibrationTables, missing_table_loads_without_calibration_and_warns) {
 
 TEST(CalibrationTables, table_path_joins_product_directory_and_file_name) {
     rs2test::TempDir dir;
-    WriteText(dir.File("product.xml"),
+    WriteFile(dir.File("product.xml"),
               DescriptionNaming({{"x=\"1\" kind=\"Beta Nought\"", "b.xml"},
                                  {"kind=\"Sigma Nought\"", "s.xml"}}));
     DocumentParse parse(dir.File("product.xml").c_str());
@@ -269,7 +263,7 @@ TEST(CalibrationTables,
     };
     rs2test::TempDir dir;
     for (const Case &c : cases) {
-        WriteText(dir.File("product.xml"), DescriptionNaming(c.tables));
+        WriteFile(dir.File("product.xml"), DescriptionNaming(c.tables));
         std::vector<std::string> expected;
         for (const std::string &kind : c.kinds)
             expected.push_back(":Calibration Type:" + kind);
@@ -278,10 +272,7 @@ TEST(CalibrationTables,
             expected)
             << c.what;
     }
-}
-
-TEST(CalibrationTables, calibration_types_need_a_document) {
-    rs2test::TempDir dir;
+    // No document, no list.
     EXPECT_EQ(ListCalibrationTypes(nullptr), nullptr);
     EXPECT_EQ(ListCalibrationTypes(dir.File("absent.xml").c_str()), nullptr);
 }

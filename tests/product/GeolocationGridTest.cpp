@@ -6,12 +6,12 @@
 #include "product/DocumentAccess.hpp"
 #include "product/ProductReader.hpp"
 #include "tests/support/TempDir.hpp"
+#include "tests/support/TestFiles.hpp"
 
 #include <gtest/gtest.h>
 
 #include <cstdio>
 #include <cstdlib>
-#include <fstream>
 #include <string>
 
 namespace {
@@ -28,9 +28,9 @@ std::string Fixed(double value) {
 // <product>.
 std::string EntryOf(const std::string &body, const char *key) {
     rs2test::TempDir dir;
-    const std::string path = dir.File("product.xml");
-    std::ofstream(path) << "<?xml version=\"1.0\"?>\n<product>" << body
-                        << "</product>\n";
+    const std::string path = rs2test::WriteFile(
+        dir.File("product.xml"),
+        "<?xml version=\"1.0\"?>\n<product>" + body + "</product>\n");
     ProductReader reader;
     reader.productPath = HString(path.c_str());
     ZirOdi2SLC model;

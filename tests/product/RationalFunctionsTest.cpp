@@ -4,6 +4,7 @@
 #include "product/DocumentAccess.hpp"
 #include "product/ProductReader.hpp"
 #include "tests/support/TempDir.hpp"
+#include "tests/support/TestFiles.hpp"
 #include "tools/generator/ProductGenerator.hpp"
 #include "tools/generator/RationalFunctions.hpp"
 #include "tools/generator/SceneGeometry.hpp"
@@ -12,7 +13,6 @@
 
 #include <array>
 #include <cmath>
-#include <fstream>
 #include <memory>
 #include <sstream>
 #include <string>
@@ -25,19 +25,15 @@ namespace {
 class SmallDocument {
   public:
     explicit SmallDocument(const std::string &rationalFunctions)
-        : parse(Write(dir, "<product><sourceAttributes><satellite>RADARSAT-3"
-                           "</satellite></sourceAttributes>" +
-                               rationalFunctions + "</product>")
+        : parse(rs2test::WriteFile(
+                    dir.File("product.xml"),
+                    "<product><sourceAttributes><satellite>RADARSAT-3"
+                    "</satellite></sourceAttributes>" +
+                        rationalFunctions + "</product>")
                     .c_str()) {}
     const xercesc::DOMDocument *Document() const { return parse.Document(); }
 
   private:
-    static std::string Write(const rs2test::TempDir &folder,
-                             const std::string &text) {
-        const std::string path = folder.File("product.xml");
-        std::ofstream(path) << text;
-        return path;
-    }
     rs2test::TempDir dir;
     DocumentParse parse;
 };

@@ -4,11 +4,12 @@
 #include "host/TextServices.hpp"
 #include "product/ProductReader.hpp"
 #include "product/StringListKeeper.hpp"
+#include "tests/support/HostLists.hpp"
 #include "tests/support/TempDir.hpp"
+#include "tests/support/TestFiles.hpp"
 
 #include <gtest/gtest.h>
 
-#include <fstream>
 #include <string>
 #include <vector>
 
@@ -19,23 +20,15 @@ namespace {
 class SideFileRead {
   public:
     explicit SideFileRead(const std::string *content) {
-        std::string productPath = dir.File("product.xml");
-        if (content != nullptr) {
-            std::ofstream out(dir.File("ProductDescription.self"),
-                              std::ios::binary);
-            out << *content;
-        }
-        reader.productPath = HString(productPath.c_str());
+        if (content != nullptr)
+            rs2test::WriteFile(dir.File("ProductDescription.self"), *content);
+        reader.productPath = HString(dir.File("product.xml").c_str());
         list.Reset(ReadSideFile(reader));
     }
 
     char **List() const { return list.Get(); }
     std::vector<std::string> Entries() const {
-        std::vector<std::string> entries;
-        for (char **entry = list.Get(); entry != nullptr && *entry != nullptr;
-             ++entry)
-            entries.emplace_back(*entry);
-        return entries;
+        return rs2test::ListTexts(list.Get());
     }
 
   private:
@@ -118,10 +111,7 @@ TEST(SideFile, reader_without_a_product_path_reads_nothing) {
 
 TEST(SideFile, extended_information_of_the_product_path_is_ignored) {
     rs2test::TempDir dir;
-    {
-        std::ofstream out(dir.File("ProductDescription.self"));
-        out << "key = 1;\n";
-    }
+    rs2test::WriteFile(dir.File("ProductDescription.self"), "key = 1;\n");
     ProductReader reader;
     reader.productPath =
         HString((dir.File("product.xml") + ":Calibration Type:Gamma").c_str());

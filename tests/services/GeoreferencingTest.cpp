@@ -1,6 +1,6 @@
+#include "host/HostMemory.hpp"
 #include "host/ProjectionServices.hpp"
 #include "host/RasterServices.hpp"
-#include "host/StringLists.hpp"
 #include "model/ProductVariants.hpp"
 #include "tests/support/LoadedProduct.hpp"
 #include "tools/generator/ProductGenerator.hpp"
@@ -16,14 +16,7 @@
 
 namespace {
 
-struct ListDeleter {
-    void operator()(char **list) const { DestroyStringList(list); }
-};
-using ListKeeper = std::unique_ptr<char *, ListDeleter>;
-
-struct ImageCloser {
-    void operator()(FILE *image) const { VXBClose(image); }
-};
+using ImageKeeper = std::unique_ptr<FILE, decltype(&VXBClose)>;
 
 // Tie points as the metadata reader hands them to the model.
 struct TieGrid {
@@ -72,7 +65,7 @@ TieGrid UtmGrid(const char *utm, double east0, double eastStep, double north0,
 
 void SetImageSize(ZirOdi2CalibImage &model, const char *columns,
                   const char *rows) {
-    ListKeeper list;
+    host::HostList list;
     if (columns)
         list.reset(SetAuxEntry(list.release(), "ColumnCount", columns));
     if (rows)
@@ -114,11 +107,11 @@ struct GcpOutput {
                  latitudes.data(), heights.data());
     }
     bool GuardsUntouched() const {
-        return ids[kRoom] == kUntouchedId && pixels[kRoom] == kUntouched &&
-               lines[kRoom] == kUntouched &&
-               pixelHeights[kRoom] == kUntouched &&
-               longitudes[kRoom] == kUntouched &&
-               latitudes[kRoom] == kUntouched && heights[kRoom] == kUntouched;
+        bool untouched = ids[kRoom] == kUntouchedId;
+        for (const auto *values : {&pixels, &lines, &pixelHeights, &longitudes,
+                                   &latitudes, &heights})
+            untouched &= (*values)[kRoom] == kUntouched;
+        return untouched;
     }
 };
 
@@ -157,12 +150,10 @@ TEST(GeoReference, fits_a_north_up_grid_with_no_rotation) {
     EXPECT_STREQ(record.geosys, "UTM 10 U D000");
     // The upper-left corner lies half a pixel before the centre of pixel 0,
     // which the grid puts at (480000, 5450000).
-    EXPECT_NEAR(record.transform[0], 480000.0 - 5.0, 1e-3); // upper-left X
-    EXPECT_NEAR(record.transform[1], 10.0, 1e-6);           // X step per column
-    EXPECT_NEAR(record.transform[2], 0.0, 1e-6);            // X step per line
-    EXPECT_NEAR(record.transform[3], 5450000.0 + 6.0, 1e-3); // upper-left Y
-    EXPECT_NEAR(record.transform[4], 0.0, 1e-6);   // Y step per column
-    EXPECT_NEAR(record.transform[5], -12.0, 1e-6); // Y step per line
+    const double expected[6] = {480000.0 - 5.0,  10.0, 0.0,
+                                5450000.0 + 6.0, 0.0,  -12.0};
+    for (int i = 0; i < 6; ++i)
+        EXPECT_NEAR(record.transform[i], expected[i], i % 3 ? 1e-6 : 1e-3) << i;
     EXPECT_EQ(record.parms[0], 10.0);
     EXPECT_EQ(record.parms[1], 1.0);
 }
@@ -253,55 +244,59 @@ TEST(GcpSegment, thins_the_tie_points_to_at_most_256_by_an_even_stride) {
 }
 
 TEST(GcpSegment, writes_the_texts_and_no_point_without_tie_points_or_image) {
-    RUZ2GrpcCR model;
-    GcpOutput out;
-    out.ReadFrom(model);
-    EXPECT_EQ(out.count, 0);
-    EXPECT_EQ(out.ids[0], kUntouchedId);
-    ExpectProductTexts(out);
-}
-
-TEST(GcpSegment,
-     hands_out_the_image_files_points_when_the_product_has_no_grid) {
+    RUZ2GrpcCR bare;
     rs2gen::ProductOptions options;
-    options.geolocationGrid = false; // the GeoTIFF keeps its tie points
-    options.tieGridColumns = 5;
-    options.tieGridRows = 4;
-    LoadedProduct loaded(options);
-    ASSERT_NE(loaded.model, nullptr);
-    ASSERT_EQ(loaded.model->GetTiePointCount(), 0);
-
-    GcpOutput fromModel;
-    fromModel.ReadFrom(*loaded.model);
-    std::unique_ptr<FILE, ImageCloser> image(
-        VXBOpen(loaded.product.imageFiles[0].c_str(), "r"));
-    ASSERT_NE(image, nullptr);
-    GcpOutput fromImage;
-    fromImage.ReadFrom(image.get());
-
-    ASSERT_EQ(fromModel.count, 20);
-    ASSERT_EQ(fromModel.count, fromImage.count);
-    EXPECT_STREQ(fromModel.groundGeosys, fromImage.groundGeosys);
-    for (int32_t k = 0; k < fromModel.count; ++k) {
-        EXPECT_EQ(fromModel.ids[k], fromImage.ids[k]);
-        EXPECT_EQ(fromModel.pixels[k], fromImage.pixels[k]);
-        EXPECT_EQ(fromModel.lines[k], fromImage.lines[k]);
-        EXPECT_EQ(fromModel.longitudes[k], fromImage.longitudes[k]);
-        EXPECT_EQ(fromModel.latitudes[k], fromImage.latitudes[k]);
-    }
-}
-
-TEST(GcpSegment, gives_no_point_when_the_image_file_cannot_be_opened) {
-    rs2gen::ProductOptions options;
-    options.images = false;
+    options.images = false; // so the image file cannot be opened
     options.geolocationGrid = false;
     LoadedProduct loaded(options);
     ASSERT_NE(loaded.model, nullptr);
+    for (ZirOdi2CalibImage *model :
+         {static_cast<ZirOdi2CalibImage *>(&bare), loaded.model.get()}) {
+        GcpOutput out;
+        out.ReadFrom(*model);
+        EXPECT_EQ(out.count, 0);
+        EXPECT_EQ(out.ids[0], kUntouchedId);
+        ExpectProductTexts(out);
+    }
+}
 
-    GcpOutput out;
-    out.ReadFrom(*loaded.model);
-    EXPECT_EQ(out.count, 0);
-    ExpectProductTexts(out);
+TEST(GcpSegment, hands_out_the_points_the_image_file_gives) {
+    // The generator writes the same grid into product.xml (pixel centres at
+    // integers) and into the GeoTIFF (raster positions): both must come out
+    // of the host alike. Without a grid in product.xml the model hands out
+    // the GeoTIFF's own points.
+    for (bool grid : {true, false}) {
+        SCOPED_TRACE(grid ? "grid" : "no grid");
+        rs2gen::ProductOptions options;
+        options.geolocationGrid = grid;
+        options.tieGridColumns = 5;
+        options.tieGridRows = 4;
+        LoadedProduct loaded(options);
+        ASSERT_NE(loaded.model, nullptr);
+        ASSERT_EQ(loaded.model->GetTiePointCount(), grid ? 20 : 0);
+        GcpOutput fromModel;
+        fromModel.ReadFrom(*loaded.model);
+        ImageKeeper image(VXBOpen(loaded.product.imageFiles[0].c_str(), "r"),
+                          &VXBClose);
+        ASSERT_NE(image, nullptr);
+        GcpOutput fromImage;
+        fromImage.ReadFrom(image.get());
+
+        ASSERT_EQ(fromModel.count, 20);
+        ASSERT_EQ(fromModel.count, fromImage.count);
+        // The product's own points keep the product's name of the system.
+        EXPECT_STREQ(fromModel.groundGeosys,
+                     grid ? "LONG      WGS84" : fromImage.groundGeosys);
+        for (int32_t k = 0; k < fromModel.count; ++k) {
+            EXPECT_EQ(fromModel.ids[k], fromImage.ids[k]);
+            EXPECT_NEAR(fromModel.pixels[k], fromImage.pixels[k], 1e-9) << k;
+            EXPECT_NEAR(fromModel.lines[k], fromImage.lines[k], 1e-9) << k;
+            EXPECT_NEAR(fromModel.longitudes[k], fromImage.longitudes[k], 1e-9)
+                << k;
+            EXPECT_NEAR(fromModel.latitudes[k], fromImage.latitudes[k], 1e-9)
+                << k;
+        }
+    }
 }
 
 namespace {
@@ -385,33 +380,5 @@ TEST(GeoReference, maps_each_pixel_centre_to_its_tie_point) {
             Apply(record.transform, tie.pixel + 0.5, tie.line + 0.5);
         EXPECT_NEAR(mapped.x, expected.x, 1e-3) << tie.pixel << "," << tie.line;
         EXPECT_NEAR(mapped.y, expected.y, 1e-3) << tie.pixel << "," << tie.line;
-    }
-}
-
-TEST(GcpSegment, hands_out_the_points_the_image_file_gives_for_the_grid) {
-    // The generator writes the same grid into product.xml (pixel centres at
-    // integers) and into the GeoTIFF (raster positions): both must come out
-    // of the host alike.
-    rs2gen::ProductOptions options;
-    LoadedProduct loaded(options);
-    ASSERT_NE(loaded.model, nullptr);
-    ASSERT_GT(loaded.model->GetTiePointCount(), 0);
-    GcpOutput fromProduct;
-    fromProduct.ReadFrom(*loaded.model);
-    std::unique_ptr<FILE, ImageCloser> image(
-        VXBOpen(loaded.product.imageFiles[0].c_str(), "r"));
-    ASSERT_NE(image, nullptr);
-    GcpOutput fromImage;
-    fromImage.ReadFrom(image.get());
-
-    ASSERT_EQ(fromProduct.count, options.tieGridColumns * options.tieGridRows);
-    ASSERT_EQ(fromProduct.count, fromImage.count);
-    for (int32_t k = 0; k < fromProduct.count; ++k) {
-        EXPECT_NEAR(fromProduct.pixels[k], fromImage.pixels[k], 1e-9) << k;
-        EXPECT_NEAR(fromProduct.lines[k], fromImage.lines[k], 1e-9) << k;
-        EXPECT_NEAR(fromProduct.longitudes[k], fromImage.longitudes[k], 1e-9)
-            << k;
-        EXPECT_NEAR(fromProduct.latitudes[k], fromImage.latitudes[k], 1e-9)
-            << k;
     }
 }

@@ -1,39 +1,24 @@
-#include "model/ZirOdi2CalibImage.hpp"
-#include "product/ProductReader.hpp"
-#include "tests/support/TempDir.hpp"
-#include "tools/generator/ProductGenerator.hpp"
+#include "host/HostMemory.hpp"
+#include "model/LookupTable.hpp"
+#include "tests/support/LoadedProduct.hpp"
+#include "tests/support/TestFiles.hpp"
 
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <cmath>
-#include <cstdlib>
-#include <cstring>
-#include <fstream>
 #include <memory>
 #include <string>
 #include <vector>
 
 namespace {
 
-// A product loaded the way the open operation loads it; the reader outlives
-// the model, which borrows from it.
-struct LoadedProduct {
-    explicit LoadedProduct(const std::string &productXml)
-        : model(LoadProduct(reader, productXml.c_str(), nullptr)) {}
-    ProductReader reader;
-    std::unique_ptr<ZirOdi2CalibImage> model;
-};
-
-struct FreeDeleter {
-    void operator()(void *memory) const { std::free(memory); }
-};
+using rs2test::LoadedProduct;
 
 // What the incidence-angle segment hands out.
 struct IncidenceArray {
     int32_t dimensions = -1;
     int32_t count = -1;
-    std::unique_ptr<double[], FreeDeleter> values;
+    std::unique_ptr<double[], host::FreeDeleter> values;
     char name[32] = {};
 };
 
@@ -58,33 +43,40 @@ rs2gen::ProductOptions Options(const std::string &type, int width) {
 }
 
 void WriteLookupTable(const std::string &path, const std::string &gains) {
-    std::ofstream(path) << "<lut><offset>0</offset><gains>" << gains
-                        << "</gains></lut>\n";
+    rs2test::WriteFile(path, "<lut><offset>0</offset><gains>" + gains +
+                                 "</gains></lut>\n");
 }
 
+// With the option "sigma" the calibration and the incidence angles share
+// the Sigma table file; each must still get the whole of it.
 TEST(IncidenceArray, angles_of_generated_products_follow_their_geometry) {
     for (const char *type : {"SGF", "SLC"}) {
-        rs2test::TempDir dir;
+        SCOPED_TRACE(type);
         const auto options = Options(type, 64);
-        const auto product = rs2gen::GenerateProduct(dir.Path(), options);
-        LoadedProduct loaded(product.productXml);
-        ASSERT_NE(loaded.model, nullptr) << type;
+        LoadedProduct loaded(options, "sigma");
+        ASSERT_NE(loaded.model, nullptr);
+        const std::vector<float> gains =
+            rs2gen::LookupTableGains(options, "Sigma Nought");
+        const LookupTable &table = loaded.model->CalibrationTable();
+        ASSERT_EQ(table.Size(), gains.size());
+        for (size_t k = 0; k < gains.size(); ++k)
+            EXPECT_EQ(table.Get(k), gains[k]) << "gain " << k;
 
         const IncidenceArray array = ReadIncidenceArray(*loaded.model);
-        EXPECT_EQ(array.dimensions, 1) << type;
-        EXPECT_STREQ(array.name, "Incidence Angle Map") << type;
-        ASSERT_EQ(array.count, options.width) << type;
+        EXPECT_EQ(array.dimensions, 1);
+        EXPECT_STREQ(array.name, "Incidence Angle Map");
+        ASSERT_EQ(array.count, options.width);
         for (int column = 0; column < options.width; ++column)
             EXPECT_NEAR(array.values[column],
                         rs2gen::IncidenceAngleDegrees(options, column), 1e-3)
-                << type << " column " << column;
+                << "column " << column;
     }
 }
 
 TEST(IncidenceArray, angle_comes_from_ratio_of_beta_to_sigma_gain) {
     struct Case {
         const char *type;
-        const char *sigmaGains;
+        const char *sigmaGains; // null: no table files at all
         const char *betaGains;
         std::vector<double> expected; // one per image column
     };
@@ -98,56 +90,50 @@ TEST(IncidenceArray, angle_comes_from_ratio_of_beta_to_sigma_gain) {
         {"SGF", "2 4 8 1", "1", {30.0, 14.4775, 7.1808, 90.0}},
         // A ratio above 1 has no angle.
         {"SGF", "1 1 1 1", "2 0 -1 1", {nan, 0.0, -90.0, 90.0}},
+        // Without tables every column reports 1.
+        {"SGF", nullptr, nullptr, {1.0, 1.0, 1.0, 1.0}},
     };
     for (const Case &c : cases) {
-        rs2test::TempDir dir;
-        const auto options = Options(c.type, 4);
-        const auto product = rs2gen::GenerateProduct(dir.Path(), options);
-        WriteLookupTable(dir.File("lutSigma.xml"), c.sigmaGains);
-        WriteLookupTable(dir.File("lutBeta.xml"), c.betaGains);
-        LoadedProduct loaded(product.productXml);
-        ASSERT_NE(loaded.model, nullptr) << c.type;
+        SCOPED_TRACE(std::string(c.type) + " " +
+                     (c.betaGains ? c.betaGains : "no tables"));
+        auto options = Options(c.type, 4);
+        options.lookupTables = c.sigmaGains != nullptr;
+        LoadedProduct loaded(options, nullptr, [&](const auto &product) {
+            if (!options.lookupTables)
+                return;
+            WriteLookupTable(product.directory + "/lutSigma.xml", c.sigmaGains);
+            WriteLookupTable(product.directory + "/lutBeta.xml", c.betaGains);
+        });
+        ASSERT_NE(loaded.model, nullptr);
 
         const IncidenceArray array = ReadIncidenceArray(*loaded.model);
         ASSERT_EQ(array.count, 4);
         for (size_t k = 0; k < c.expected.size(); ++k) {
             if (std::isnan(c.expected[k]))
-                EXPECT_TRUE(std::isnan(array.values[k]))
-                    << c.type << " " << c.betaGains << " column " << k;
+                EXPECT_TRUE(std::isnan(array.values[k])) << "column " << k;
             else
                 EXPECT_NEAR(array.values[k], c.expected[k], 1e-4)
-                    << c.type << " " << c.betaGains << " column " << k;
+                    << "column " << k;
         }
     }
 }
 
-TEST(IncidenceArray, product_without_tables_reports_one_for_every_column) {
-    rs2test::TempDir dir;
-    auto options = Options("SGF", 12);
-    options.lookupTables = false;
-    const auto product = rs2gen::GenerateProduct(dir.Path(), options);
-    LoadedProduct loaded(product.productXml);
+TEST(IncidenceArray, name_is_optional) {
+    LoadedProduct loaded(Options("SGF", 12), nullptr);
     ASSERT_NE(loaded.model, nullptr);
-
-    // The name is optional.
-    int32_t dimensions = 0;
-    int32_t count = 0;
+    int32_t dimensions = 0, count = 0;
     double *values = nullptr;
     loaded.model->IncidenceArraySegment(&dimensions, &count, &values, nullptr);
-    const std::unique_ptr<double[], FreeDeleter> owner(values);
+    const std::unique_ptr<double[], host::FreeDeleter> owner(values);
     EXPECT_EQ(dimensions, 1);
-    ASSERT_EQ(count, 12);
-    for (int k = 0; k < count; ++k)
-        EXPECT_EQ(values[k], 1.0) << k;
+    EXPECT_EQ(count, 12);
 }
 
 TEST(IncidenceArray, dataset_without_first_image_has_empty_array) {
-    rs2test::TempDir dir;
     // HH and VH only: channel 1 shows VV, which has no image file.
     auto options = Options("SGF", 8);
     options.polarizations = {"HH", "VH"};
-    const auto product = rs2gen::GenerateProduct(dir.Path(), options);
-    LoadedProduct loaded(product.productXml);
+    LoadedProduct loaded(options, nullptr);
     ASSERT_NE(loaded.model, nullptr);
 
     const IncidenceArray array = ReadIncidenceArray(*loaded.model);

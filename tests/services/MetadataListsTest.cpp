@@ -4,6 +4,7 @@
 #include "model/ProductTypes.hpp"
 #include "model/ProductVariants.hpp"
 #include "product/StringListKeeper.hpp"
+#include "tests/support/HostLists.hpp"
 
 #include <gtest/gtest.h>
 
@@ -20,17 +21,7 @@ constexpr int32_t kVH = static_cast<int32_t>(Polarization::VH);
 constexpr int32_t kHV = static_cast<int32_t>(Polarization::HV);
 constexpr int32_t kVV = static_cast<int32_t>(Polarization::VV);
 
-std::vector<std::string> Texts(char *const *list) {
-    std::vector<std::string> texts;
-    for (int i = 0; list != nullptr && list[i] != nullptr; ++i)
-        texts.emplace_back(list[i]);
-    return texts;
-}
-
-std::optional<std::string> Entry(char *const *list, const char *key) {
-    const char *value = FetchAuxEntry(list, key);
-    return value != nullptr ? std::optional<std::string>(value) : std::nullopt;
-}
+using rs2test::ListTexts;
 
 void AddBands(ZirOdi2CalibImage &model, const std::vector<int32_t> &codes) {
     for (int32_t code : codes)
@@ -47,7 +38,7 @@ std::optional<std::string> FileEntry(ZirOdi2CalibImage &model,
                                      const char *key) {
     StringListKeeper list;
     list.Reset(model.FileMetadata(list.Release()));
-    return Entry(list.Get(), key);
+    return rs2test::ListEntry(list.Get(), key);
 }
 
 TEST(MetadataLists, name_tables) {
@@ -87,9 +78,9 @@ TEST(MetadataLists, file_metadata_extends_the_callers_list_in_order) {
         "BeamMode: FQ1", "RowCount: 30",
         "DefaultRed: 1", "DefaultGreen: 2", "DefaultBlue: 4"};
     // clang-format on
-    EXPECT_EQ(Texts(list.Get()), expected);
+    EXPECT_EQ(ListTexts(list.Get()), expected);
     // The model keeps its own list.
-    EXPECT_EQ(Texts(model.GetMetadata()),
+    EXPECT_EQ(ListTexts(model.GetMetadata()),
               (std::vector<std::string>{"BeamMode: FQ1", "RowCount: 30"}));
 }
 
@@ -196,7 +187,7 @@ TEST(MetadataLists, channel_metadata_describes_a_defined_channel) {
         list.Reset(model->ChannelMetadata(c.channel, list.Release()));
         std::vector<std::string> expected = {"Caller: kept"};
         expected.insert(expected.end(), c.entries.begin(), c.entries.end());
-        EXPECT_EQ(Texts(list.Get()), expected);
+        EXPECT_EQ(ListTexts(list.Get()), expected);
     }
 }
 
@@ -235,7 +226,7 @@ TEST(MetadataLists, channel_descriptions) {
 TEST(MetadataLists, incidence_angle_entry_is_appended) {
     StringListKeeper list(AddStringToList(nullptr, "First: 1"));
     list.Reset(ZirOdi2CalibImage::IncidenceAngleMetadata(list.Release()));
-    EXPECT_EQ(Texts(list.Get()),
+    EXPECT_EQ(ListTexts(list.Get()),
               (std::vector<std::string>{"First: 1", "IncidenceAngle: vector"}));
 }
 

@@ -1,8 +1,9 @@
 #include "services/OrbitSegment.hpp"
 
 #include "host/ErrorReports.hpp"
+#include "host/Exception.hpp"
+#include "host/HostMemory.hpp"
 #include "host/RasterServices.hpp"
-#include "host/StringLists.hpp"
 
 #include <gtest/gtest.h>
 
@@ -13,9 +14,6 @@
 
 namespace {
 
-struct ListDeleter {
-    void operator()(char **list) const { DestroyStringList(list); }
-};
 struct EphemerisDeleter {
     void operator()(EphemerisSeg_t *record) const {
         VXBSatEphemerisFree(record);
@@ -36,7 +34,7 @@ struct ServedArrays {
 };
 
 EphemerisKeeper SampleOrbit() {
-    std::unique_ptr<char *, ListDeleter> list(
+    host::HostList list(
         SetAuxEntry(nullptr, "SatPositions",
                     "2017-04-30T08:00:00.000000Z;1;2;3;4;5;6;"
                     "2017-04-30T08:00:10.000000Z;11;12;13;14;15;16;"));
@@ -103,4 +101,28 @@ TEST(ServeOrbit, reports_error_23_naming_the_dataset_without_an_orbit) {
         EXPECT_EQ(destination.stateVectorCount, 99);
         EXPECT_EQ(destination.stateVectors, nullptr);
     }
+}
+
+TEST(GetOrbitPtr, refuses_state_vectors_it_cannot_read_and_drops_attitudes) {
+    const char *const positions[] = {
+        nullptr, // no entry
+        "",
+        "2017-04-30T08:00:00.000000Z;1;2;3;4;5;", // six fields
+        "2017-04-30;1;2;3;4;5;6;",                // no time of day
+        "2017-04-30T08:00:00.000000Z;1;2;x;4;5;6;",
+    };
+    for (const char *text : positions) {
+        host::HostList list(text ? SetAuxEntry(nullptr, "SatPositions", text)
+                                 : nullptr);
+        EXPECT_THROW(GetOrbitPtr(list.get(), nullptr), orv::DataException)
+            << (text ? text : "no entry");
+    }
+    // Malformed attitudes cost only the attitudes.
+    host::HostList list(SetAuxEntry(
+        nullptr, "SatPositions", "2017-04-30T08:00:00.000000Z;1;2;3;4;5;6;"));
+    list.reset(SetAuxEntry(list.release(), "SatAttitudes", "28800;0.1;x;0.3;"));
+    EphemerisKeeper orbit(GetOrbitPtr(list.get(), nullptr));
+    ASSERT_NE(orbit, nullptr);
+    EXPECT_EQ(orbit->stateVectorCount, 1);
+    EXPECT_EQ(orbit->attitudeCount, 0);
 }

@@ -1,38 +1,19 @@
+#include "tests/support/CommandRun.hpp"
 #include "tests/support/TempDir.hpp"
 #include "tools/generator/ProductGenerator.hpp"
 
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 
-#include <array>
-#include <cstdio>
-#include <memory>
 #include <string>
-#include <sys/wait.h>
 
 namespace {
 
-struct CommandResult {
-    int exitCode;
-    std::string output; // standard output only
-};
+using rs2test::Quoted;
 
-CommandResult RunTool(const std::string &arguments) {
-    std::string command =
-        std::string("'") + RS2_TOOL + "' " + arguments + " 2>/dev/null";
-    FILE *pipe = popen(command.c_str(), "r");
-    if (pipe == nullptr)
-        return {-1, ""};
-    std::string output;
-    std::array<char, 4096> chunk{};
-    size_t read = 0;
-    while ((read = std::fread(chunk.data(), 1, chunk.size(), pipe)) > 0)
-        output.append(chunk.data(), read);
-    int status = pclose(pipe);
-    return {WIFEXITED(status) ? WEXITSTATUS(status) : -1, output};
+rs2test::CommandResult RunTool(const std::string &arguments) {
+    return rs2test::RunShell(Quoted(RS2_TOOL) + " " + arguments);
 }
-
-std::string Quoted(const std::string &text) { return "'" + text + "'"; }
 
 class ToolOnProduct : public ::testing::Test {
   protected:
@@ -51,7 +32,7 @@ class ToolOnProduct : public ::testing::Test {
 } // namespace
 
 TEST_F(ToolOnProduct, info_json_keeps_its_contract) {
-    CommandResult result =
+    rs2test::CommandResult result =
         RunTool("info --json " + Quoted(product.productXml + "?c=sigma"));
     ASSERT_EQ(result.exitCode, 0);
     nlohmann::json info = nlohmann::json::parse(result.output);
@@ -77,8 +58,9 @@ TEST_F(ToolOnProduct, info_json_keeps_its_contract) {
 }
 
 TEST_F(ToolOnProduct, read_json_gives_the_stored_samples) {
-    CommandResult result = RunTool("read --json " + Quoted(product.productXml) +
-                                   " --window 3 2 4 3 --size 2 3 --channels 2");
+    rs2test::CommandResult result =
+        RunTool("read --json " + Quoted(product.productXml) +
+                " --window 3 2 4 3 --size 2 3 --channels 2");
     ASSERT_EQ(result.exitCode, 0);
     nlohmann::json read = nlohmann::json::parse(result.output);
     EXPECT_EQ(read["type"], 3);
@@ -110,7 +92,8 @@ TEST_F(ToolOnProduct, exit_codes_tell_errors_from_bad_usage) {
 }
 
 TEST_F(ToolOnProduct, text_prints_the_product_description) {
-    CommandResult result = RunTool("text " + Quoted(product.productXml));
+    rs2test::CommandResult result =
+        RunTool("text " + Quoted(product.productXml));
     ASSERT_EQ(result.exitCode, 0);
     EXPECT_EQ(result.output.rfind("<?xml", 0), 0u);
     EXPECT_NE(result.output.find("<productType>SGF</productType>"),
