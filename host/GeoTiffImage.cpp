@@ -8,10 +8,10 @@
 #include <cmath>
 #include <cstddef>
 #include <cstring>
-#include <fstream>
 #include <limits>
 #include <new>
 #include <type_traits>
+#include <unistd.h>
 
 // Window reads. Output pixel (k, j) comes from source pixel
 // (xoff + floor(k * xsize / dstx), yoff + floor(j * ysize / dsty)); only the
@@ -114,17 +114,23 @@ WindowPlan MakePlan(const TiffLayout &layout, const WindowRequest &window,
                     const std::vector<int32_t> &channels) {
     WindowPlan plan;
     plan.neededColumns.assign(layout.blocksAcross, false);
-    plan.columnOffsets.resize(size_t(window.dstx));
-    for (int64_t k = 0; k < window.dstx; ++k) {
-        const auto x = static_cast<uint32_t>(
-            SourceIndex(window.xoff, window.xsize, window.dstx, k));
-        const uint32_t column = x / layout.blockWidth;
-        plan.neededColumns[column] = true;
-        plan.columnOffsets[size_t(k)] =
-            column * layout.BlockStride() +
-            size_t(x % layout.blockWidth) * layout.ElementsPerPixel();
-    }
     plan.unitColumns = window.dstx == window.xsize && layout.blocksAcross == 1;
+    // Unit columns are copied as one run: the per-column offsets, a 64-bit
+    // division each, would cost as much as the copy itself.
+    if (plan.unitColumns) {
+        plan.neededColumns[0] = true;
+    } else {
+        plan.columnOffsets.resize(size_t(window.dstx));
+        for (int64_t k = 0; k < window.dstx; ++k) {
+            const auto x = static_cast<uint32_t>(
+                SourceIndex(window.xoff, window.xsize, window.dstx, k));
+            const uint32_t column = x / layout.blockWidth;
+            plan.neededColumns[column] = true;
+            plan.columnOffsets[size_t(k)] =
+                column * layout.BlockStride() +
+                size_t(x % layout.blockWidth) * layout.ElementsPerPixel();
+        }
+    }
     plan.neededPlanes.assign(layout.PlaneCount(), false);
     for (int32_t channel : channels) {
         const auto index = static_cast<uint32_t>(channel - 1);
@@ -349,8 +355,12 @@ bool HasTiffSignature(const std::string &path) {
         {'M', 'M', 0, 43}, // BigTIFF
     };
     unsigned char start[4] = {};
-    std::ifstream stream(path, std::ios::binary);
-    if (!stream.read(reinterpret_cast<char *>(start), sizeof start))
+    const int descriptor = OpenRegularFile(path);
+    if (descriptor < 0)
+        return false;
+    const ssize_t got = read(descriptor, start, sizeof start);
+    close(descriptor);
+    if (got != static_cast<ssize_t>(sizeof start))
         return false;
     for (const auto &signature : kSignatures)
         if (std::memcmp(start, signature, sizeof start) == 0)

@@ -2,8 +2,15 @@
 
 #include "host/TextServices.hpp"
 
+#include <limits>
 #include <string>
 #include <utility>
+#include <vector>
+
+// Calibration divides by gains a product file gives, zero among them; only
+// IEEE floats make that division defined (an infinity or not a number).
+static_assert(std::numeric_limits<float>::is_iec559,
+              "calibration needs IEEE float division");
 
 namespace {
 
@@ -79,12 +86,17 @@ void ForEachSampleWithGain(const LookupTable &table, int32_t xOffset,
                            Convert convert) {
     if (samples == nullptr || width <= 0 || height <= 0)
         return;
+    // Gains first, then the plane row by row in memory order, which the
+    // compiler turns into vector arithmetic.
     const auto stride = static_cast<std::size_t>(width);
-    for (int32_t c = 0; c < width; ++c) {
-        float gain = ColumnGain(table, static_cast<int64_t>(xOffset) + c);
-        float *sample = samples + c;
-        for (int32_t r = 0; r < height; ++r, sample += stride)
-            *sample = convert(*sample, gain);
+    std::vector<float> gains(stride);
+    for (int32_t c = 0; c < width; ++c)
+        gains[static_cast<std::size_t>(c)] =
+            ColumnGain(table, static_cast<int64_t>(xOffset) + c);
+    for (int32_t r = 0; r < height; ++r) {
+        float *row = samples + static_cast<std::size_t>(r) * stride;
+        for (std::size_t c = 0; c < stride; ++c)
+            row[c] = convert(row[c], gains[c]);
     }
 }
 

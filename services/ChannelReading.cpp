@@ -183,13 +183,31 @@ void InterleavePlanes(float *buffer, const PlaneSet &planes,
         return;
     const std::size_t pixels = ElementCount(bufferXSize, bufferYSize);
     const auto stride = static_cast<std::size_t>(channelCount);
+    std::vector<const float *> sources(stride);
     for (int32_t c = 0; c < channelCount; ++c) {
         const auto found = planes.find(channelList[c]);
-        const float *plane =
+        sources[static_cast<std::size_t>(c)] =
             found != planes.end() ? found->second.get() : nullptr;
+    }
+    // Two channels (a dual-polarization product) are interleaved pairwise,
+    // which the compiler turns into vector shuffles.
+    if (stride == 2 && sources[0] != nullptr && sources[1] != nullptr) {
+        const float *first = sources[0];
+        const float *second = sources[1];
+        for (std::size_t p = 0; p < pixels; ++p) {
+            buffer[2 * p] = first[p];
+            buffer[2 * p + 1] = second[p];
+        }
+        return;
+    }
+    for (std::size_t c = 0; c < stride; ++c) {
         float *out = buffer + c;
-        for (std::size_t p = 0; p < pixels; ++p)
-            out[p * stride] = plane != nullptr ? plane[p] : 0.0f;
+        if (const float *plane = sources[c])
+            for (std::size_t p = 0; p < pixels; ++p)
+                out[p * stride] = plane[p];
+        else
+            for (std::size_t p = 0; p < pixels; ++p)
+                out[p * stride] = 0.0f;
     }
 }
 
