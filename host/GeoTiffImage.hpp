@@ -68,7 +68,8 @@ class GeoTiffImage {
     std::unique_ptr<State> state;
 };
 
-/// True when the file at path starts with a TIFF or BigTIFF signature.
+/// True when path is a regular file that starts with a TIFF or BigTIFF
+/// signature; anything else is answered without waiting on it.
 bool HasTiffSignature(const std::string &path);
 
 } // namespace host

@@ -130,6 +130,20 @@ void UnmapProc(thandle_t client, void *base, toff_t size) {
 
 } // namespace
 
+int OpenRegularFile(const std::string &path) {
+    const int descriptor =
+        open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
+    if (descriptor < 0)
+        return -1;
+    struct stat info {};
+    if (fstat(descriptor, &info) != 0 || !S_ISREG(info.st_mode)) {
+        close(descriptor);
+        errno = EINVAL;
+        return -1;
+    }
+    return descriptor;
+}
+
 TiffFile::TiffFile(const std::string &pathIn)
     : path(pathIn), lastError(std::make_unique<std::string>()) {
     InstallTagDefinitions();
@@ -141,9 +155,9 @@ TiffFile::TiffFile(const std::string &pathIn)
                                        lastError.get());
     TIFFOpenOptionsSetWarningHandlerExtR(options.get(), DropWarning, nullptr);
     mapping = std::make_unique<Mapping>();
-    mapping->descriptor = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    mapping->descriptor = OpenRegularFile(path);
     if (mapping->descriptor < 0)
-        Fail("cannot open the file");
+        Fail(errno == EINVAL ? "not a regular file" : "cannot open the file");
     tiff.reset(TIFFClientOpenExt(path.c_str(), "r", mapping.get(), ReadProc,
                                  WriteProc, SeekProc, CloseProc, SizeProc,
                                  MapProc, UnmapProc, options.get()));

@@ -16,6 +16,12 @@ constexpr int32_t kErrBadRequest = 5;     // window, size or channel refused
 /// TIFF tag of the RPC model (92 doubles, see TiffGeoreferencing.cpp).
 constexpr ttag_t kRpcCoefficientTag = 50844;
 
+/// A read-only descriptor of the file at path, which the caller closes, or
+/// -1 when it cannot be opened or is no regular file (errno is then EINVAL).
+/// The open never waits: a pipe or a device named like an image is refused
+/// at once instead of blocking until some writer appears.
+int OpenRegularFile(const std::string &path);
+
 /// The one owner of a libtiff handle. The file is opened read-only and
 /// memory-mapped by this class: uncompressed strips are then copied straight
 /// from the page cache, which halves the time of a full read compared with a

@@ -17,6 +17,24 @@ class VXB_API ORV_XMLUtil {
     static int InitializeCount();
 };
 
+/// One XML platform initialisation held for the life of the object.
+class XmlPlatformHold {
+  public:
+    XmlPlatformHold() : held(ORV_XMLUtil::Initialize() != 0) {}
+    ~XmlPlatformHold() {
+        if (held)
+            ORV_XMLUtil::Terminate();
+    }
+    XmlPlatformHold(const XmlPlatformHold &) = delete;
+    XmlPlatformHold &operator=(const XmlPlatformHold &) = delete;
+
+    /// True when the platform is ready.
+    bool Held() const { return held; }
+
+  private:
+    bool held;
+};
+
 /// Conversion between narrow UTF-8 text and the parser's XMLCh text.
 /// Built from narrow text it yields XMLCh text; built from XMLCh text it
 /// yields a std::string. An empty value yields empty texts. Malformed input

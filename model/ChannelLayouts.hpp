@@ -33,8 +33,14 @@ char *QuadPolarizationText();
 
 /// Detected samples to calibrated values: (s * s + offset) / gain, with the
 /// gain of each sample's product column (window column plus xOffset).
+/// Gains are taken as the table gives them, in IEEE arithmetic: a zero gain
+/// makes the value infinite (not a number when s * s + offset is 0 too), a
+/// negative gain flips its sign. A table file with tokens that hold no
+/// number ends in zero gains (its reader packs the numbers from entry 0), so
+/// such damage shows as infinities in the last columns.
 void CalibrateDetectedSamples(const LookupTable &table, int32_t xOffset,
                               int32_t width, int32_t height, float *samples);
-/// Complex samples divided by the gain of their product column.
+/// Complex samples divided by the gain of their product column; a zero gain
+/// gives infinities (not a number for a zero sample), as above.
 void DivideByColumnGain(const LookupTable &table, int32_t xOffset,
                         int32_t width, int32_t height, float *samples);

@@ -2,6 +2,7 @@
 
 #include "model/ZirOdi2CalibImage.hpp"
 #include "product/DocumentAccess.hpp"
+#include "product/ProductFileNames.hpp"
 #include "product/TextHelpers.hpp"
 
 void ReadPolarizations(const xercesc::DOMDocument *document,
@@ -16,6 +17,12 @@ void ReadPolarizations(const xercesc::DOMDocument *document,
         if (code == Polarization::Unknown)
             continue;
         HostString fileName(ImageFileForPolarization(document, name.c_str()));
+        // A refused name leaves the band without a file, as a polarization
+        // without an image element is.
+        if (!IsNameInsideProduct(fileName.get())) {
+            WarnNameOutsideProduct(fileName.get());
+            fileName.reset();
+        }
         model->AddBand(static_cast<int32_t>(code), fileName.get());
     }
 }

@@ -6,7 +6,9 @@
 
 class ZirOdi2CalibImage;
 
-/// Registers one band per recognised polarization of the product.
+/// Registers one band per recognised polarization of the product. A band
+/// whose image file name leads out of the product folder is registered
+/// without a file, after a warning naming it.
 void ReadPolarizations(const xercesc::DOMDocument *document,
                        ZirOdi2CalibImage *model);
 /// Polarization code of a name (whole text, any case); Unknown for null.

@@ -15,6 +15,7 @@
 #include "model/ZirOdi2CalibImage.hpp"
 #include "product/DocumentAccess.hpp"
 #include "product/FloatText.hpp"
+#include "product/ProductFileNames.hpp"
 
 #include <algorithm>
 #include <cmath>
@@ -55,16 +56,17 @@ constexpr char kLookupTableUnreadable[] =
 
 // The path of the table file whose lookupTable attribute contains pattern,
 // joined to the product directory (which ends in its separator), as a host
-// string the caller frees. matchedValue receives the attribute as written.
+// string the caller frees; null when none matches or when files refuses its
+// name. matchedValue receives the attribute as written.
 char *LookupTablePath(const xercesc::DOMDocument *document,
                       const ZirOdi2CalibImage *model, const char *pattern,
-                      std::string *matchedValue) {
+                      std::string *matchedValue, LookupTableFiles &files) {
     if (document == nullptr || model == nullptr || pattern == nullptr)
         return nullptr;
     HostText fileName(FindTextByAttribute(document, kLookupTableTag,
                                           AttributeMatch::ContainsIgnoringCase,
                                           pattern, matchedValue));
-    if (!fileName)
+    if (!fileName || !files.Admits(fileName.get()))
         return nullptr;
     // Without a product directory the file name is taken as it stands.
     const char *directory = model->GetProductDirectory();
@@ -205,14 +207,23 @@ CalibrationTypeNames(const xercesc::DOMDocument *document) {
 
 char *FindLookupTableFile(const xercesc::DOMDocument *document,
                           const ZirOdi2CalibImage *model, const char *pattern) {
-    return LookupTablePath(document, model, pattern, nullptr);
+    LookupTableFiles files;
+    return FindLookupTableFile(document, model, pattern, files);
+}
+
+char *FindLookupTableFile(const xercesc::DOMDocument *document,
+                          const ZirOdi2CalibImage *model, const char *pattern,
+                          LookupTableFiles &files) {
+    return LookupTablePath(document, model, pattern, nullptr, files);
 }
 
 char *SelectCalibrationFile(const xercesc::DOMDocument *document,
-                            ZirOdi2CalibImage *model, const char *pattern) {
+                            ZirOdi2CalibImage *model, const char *pattern,
+                            LookupTableFiles &files) {
     std::string kind;
-    char *path = LookupTablePath(
-        document, model, pattern != nullptr ? pattern : kDefaultKind, &kind);
+    char *path = LookupTablePath(document, model,
+                                 pattern != nullptr ? pattern : kDefaultKind,
+                                 &kind, files);
     if (path != nullptr)
         model->SetCalibrationType(kind.c_str());
     return path;
@@ -223,6 +234,18 @@ std::unique_ptr<LookupTable> ReadLookupTableFile(const char *path) {
         return nullptr;
     return UnlessParseFails<std::unique_ptr<LookupTable>>(
         [path] { return ParseLookupTableFile(path); });
+}
+
+bool LookupTableFiles::Admits(const char *name) {
+    if (IsNameInsideProduct(name))
+        return true;
+    const std::string refused = name;
+    if (std::find(refusedNames.begin(), refusedNames.end(), refused) ==
+        refusedNames.end()) {
+        WarnNameOutsideProduct(name);
+        refusedNames.push_back(refused);
+    }
+    return false;
 }
 
 const LookupTable *LookupTableFiles::Read(const char *path) {
@@ -246,7 +269,7 @@ void LoadCalibration(const xercesc::DOMDocument *document,
                      LookupTableFiles &files) {
     if (document == nullptr || model == nullptr)
         return;
-    HostText path(SelectCalibrationFile(document, model, option));
+    HostText path(SelectCalibrationFile(document, model, option, files));
     if (!path) {
         WarnWithoutCalibration(model, _(kNoLookupTableName));
         return;
@@ -278,8 +301,8 @@ void ReadIncidenceAngles(const xercesc::DOMDocument *document,
                          LookupTableFiles &files) {
     if (document == nullptr || model == nullptr)
         return;
-    HostText sigmaPath(FindLookupTableFile(document, model, "Sigma"));
-    HostText betaPath(FindLookupTableFile(document, model, "Beta"));
+    HostText sigmaPath(FindLookupTableFile(document, model, "Sigma", files));
+    HostText betaPath(FindLookupTableFile(document, model, "Beta", files));
     if (!sigmaPath || !betaPath)
         return;
     const LookupTable *sigma = files.Read(sigmaPath.get());

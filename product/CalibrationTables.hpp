@@ -20,9 +20,15 @@ class LookupTableFiles {
     /// on the first request for that path; null for a null path and for a
     /// file that yields no table.
     const LookupTable *Read(const char *path);
+    /// Whether a table file name of product.xml may be read: a name that
+    /// leads out of the product folder is refused, with a warning naming it
+    /// the first time this load meets it (the calibration and the incidence
+    /// angles may both ask for it).
+    bool Admits(const char *name);
 
   private:
     std::vector<std::pair<std::string, std::unique_ptr<LookupTable>>> tables;
+    std::vector<std::string> refusedNames;
 };
 
 /// Loads the look-up table of the kind option names ("sigma", "beta",
@@ -35,13 +41,21 @@ void LoadCalibration(const xercesc::DOMDocument *document,
                      ZirOdi2CalibImage *model, const char *option,
                      LookupTableFiles &files);
 /// Full path of the table file whose lookupTable attribute contains pattern
-/// (any case), as a host string the caller frees; null when none matches.
+/// (any case), as a host string the caller frees; null when none matches,
+/// and when its file name leads out of the product folder (after a warning
+/// naming it: such a table is taken as missing).
 char *FindLookupTableFile(const xercesc::DOMDocument *document,
                           const ZirOdi2CalibImage *model, const char *pattern);
+/// As above, with the names refused while one product loads reported once.
+char *FindLookupTableFile(const xercesc::DOMDocument *document,
+                          const ZirOdi2CalibImage *model, const char *pattern,
+                          LookupTableFiles &files);
 /// As FindLookupTableFile (pattern "Sigma Nought" when null), and records the
-/// matched attribute value as the model's calibration type.
+/// matched attribute value as the model's calibration type when it gives a
+/// path.
 char *SelectCalibrationFile(const xercesc::DOMDocument *document,
-                            ZirOdi2CalibImage *model, const char *pattern);
+                            ZirOdi2CalibImage *model, const char *pattern,
+                            LookupTableFiles &files);
 /// The table file at path, or null when it yields no document with a root
 /// element and a gains element (no XML, cut short before its gains, or
 /// without gains).

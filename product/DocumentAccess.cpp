@@ -1,11 +1,13 @@
 #include "product/DocumentAccess.hpp"
 
+#include "host/ErrorReports.hpp"
 #include "host/TextServices.hpp"
 
 #include <cstring>
 #include <string>
 #include <string_view>
 #include <strings.h>
+#include <sys/stat.h>
 #include <unordered_map>
 #include <utility>
 
@@ -17,8 +19,16 @@
 #include <xercesc/dom/DOMNamedNodeMap.hpp>
 #include <xercesc/dom/DOMNode.hpp>
 #include <xercesc/dom/DOMNodeList.hpp>
+#include <xercesc/framework/LocalFileInputSource.hpp>
+#include <xercesc/framework/XMLAttr.hpp>
+#include <xercesc/framework/XMLElementDecl.hpp>
+#include <xercesc/internal/XMLScanner.hpp>
+#include <xercesc/sax/Locator.hpp>
 #include <xercesc/util/PlatformUtils.hpp>
+#include <xercesc/util/RefVectorOf.hpp>
+#include <xercesc/util/SecurityManager.hpp>
 #include <xercesc/util/XMLString.hpp>
+#include <xercesc/validators/DTD/DTDElementDecl.hpp>
 
 using xercesc::DOMDocument;
 using xercesc::DOMElement;
@@ -137,15 +147,113 @@ const DOMElement *FindElement(const DOMDocument *document, const char *tag,
     return nullptr;
 }
 
-// Releases a buffer that XMLString::transcode allocated.
-struct TranscodedText {
-    char *text;
-    explicit TranscodedText(const XMLCh *source)
+// Releases a buffer that XMLString::transcode allocated: narrow text made of
+// XMLCh text, or XMLCh text made of narrow text (in the local code page, as
+// the parser reads the paths it is given).
+template <class To, class From> struct Transcoded {
+    To *text;
+    explicit Transcoded(const From *source)
         : text(xercesc::XMLString::transcode(source)) {}
-    ~TranscodedText() { xercesc::XMLString::release(&text); }
-    TranscodedText(const TranscodedText &) = delete;
-    TranscodedText &operator=(const TranscodedText &) = delete;
+    ~Transcoded() { xercesc::XMLString::release(&text); }
+    Transcoded(const Transcoded &) = delete;
+    Transcoded &operator=(const Transcoded &) = delete;
 };
+
+// The error code the host gives a file it refuses to read.
+constexpr int32_t kErrUnreadableFile = 3;
+
+// The most entity references a document may expand. The XML files of a
+// product declare no entities (the predefined ones and character references
+// do not count), and a document that could declare any is refused before its
+// declarations are read; the limit is a second line behind that.
+constexpr XMLSize_t kEntityExpansionLimit = 100;
+// The deepest nesting of elements a document may have. The XML files of a
+// product nest theirs fewer than ten deep; the parser's text of an element
+// recurses through every level below it, so a file nested a million deep
+// would overflow the stack.
+constexpr int kMaxElementDepth = 100;
+
+// A DOM parser that reads the one local file it is given and nothing else.
+// A document type declaration ends the parse as soon as its name is read,
+// before its internal subset or any external DTD: no DTD is ever loaded, no
+// entity of the document is declared, and nothing is fetched. Should an
+// entity ever be declared, none is resolved outside the document and their
+// expansion is capped. Elements nested deeper than any product's end the
+// parse too.
+class ProductDomParser : public XercesDOMParser {
+  public:
+    // Thrown out of the parse when the document is refused.
+    struct Refused {
+        std::string reason;
+        XMLFileLoc line;
+    };
+
+    ProductDomParser()
+        : XercesDOMParser(nullptr, xercesc::XMLPlatformUtils::fgMemoryManager,
+                          nullptr) {
+        setValidationScheme(XercesDOMParser::Val_Always);
+        setLoadExternalDTD(false);
+        setDisableDefaultEntityResolution(true);
+        securityManager.setEntityExpansionLimit(kEntityExpansionLimit);
+        setSecurityManager(&securityManager);
+    }
+
+    void doctypeDecl(const xercesc::DTDElementDecl &, const XMLCh *,
+                     const XMLCh *, bool, bool) override {
+        Refuse("it declares a document type");
+    }
+
+    void startElement(const xercesc::XMLElementDecl &element,
+                      unsigned int urlId, const XMLCh *prefix,
+                      const xercesc::RefVectorOf<xercesc::XMLAttr> &attributes,
+                      XMLSize_t attributeCount, bool isEmpty,
+                      bool isRoot) override {
+        if (!isEmpty && ++depth > kMaxElementDepth)
+            Refuse("its elements nest more than " +
+                   std::to_string(kMaxElementDepth) + " deep");
+        XercesDOMParser::startElement(element, urlId, prefix, attributes,
+                                      attributeCount, isEmpty, isRoot);
+    }
+
+    void endElement(const xercesc::XMLElementDecl &element, unsigned int urlId,
+                    bool isRoot, const XMLCh *prefix) override {
+        --depth;
+        XercesDOMParser::endElement(element, urlId, isRoot, prefix);
+    }
+
+  private:
+    [[noreturn]] void Refuse(const std::string &reason) const {
+        const xercesc::Locator *locator = getScanner()->getLocator();
+        throw Refused{reason,
+                      locator != nullptr ? locator->getLineNumber() : 0};
+    }
+
+    xercesc::SecurityManager securityManager;
+    int depth = 0; // elements open at the point of the parse
+};
+
+// Only a regular file is handed to the parser: a pipe or a device named like
+// a product file would block the parse or never end it.
+bool IsRegularFile(const char *path) {
+    struct stat info {};
+    return path != nullptr && stat(path, &info) == 0 && S_ISREG(info.st_mode);
+}
+
+// Parses the file at path, always as a local file: a path that happens to
+// read as a URL is never fetched. A refused document is reported with the
+// host's error report.
+void ParseLocalFile(ProductDomParser &parser, const char *path) {
+    Transcoded<XMLCh, char> wide(path);
+    try {
+        parser.parse(xercesc::LocalFileInputSource(wide.text));
+    } catch (const ProductDomParser::Refused &refused) {
+        IMPError(kErrUnreadableFile, host::kError,
+                 "Refused %s: %s (line %llu), which the XML files of a "
+                 "product never do",
+                 path, refused.reason.c_str(),
+                 static_cast<unsigned long long>(refused.line));
+    }
+}
 
 // The text content of node. getTextContent copies it into the document's
 // memory, which keeps every copy until the document is released; an element
@@ -176,7 +284,7 @@ std::string NarrowText(const XMLCh *text) {
     }
     if (seen < 0x80)
         return narrow;
-    TranscodedText transcoded(text);
+    Transcoded<char, XMLCh> transcoded(text);
     return transcoded.text != nullptr ? std::string(transcoded.text)
                                       : std::string();
 }
@@ -234,11 +342,11 @@ DocumentParse::DocumentParse(const char *path, Platform platform) {
         platformHeld = true;
     }
     try {
-        parser = std::make_unique<XercesDOMParser>(
-            nullptr, xercesc::XMLPlatformUtils::fgMemoryManager, nullptr);
-        parser->setValidationScheme(XercesDOMParser::Val_Always);
-        if (path != nullptr)
-            parser->parse(path);
+        auto productParser = std::make_unique<ProductDomParser>();
+        ProductDomParser &parsing = *productParser;
+        parser = std::move(productParser);
+        if (IsRegularFile(path))
+            ParseLocalFile(parsing, path);
         document = parser->getDocument();
         if (document != nullptr) {
             index = std::make_unique<ElementIndex>(document);

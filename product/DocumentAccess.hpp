@@ -17,6 +17,13 @@ class ElementIndex;
 /// platform initialisation, released once on every way out; a nested parse
 /// (look-up table files read while the description is parsed) runs under
 /// the initialisation already in force.
+///
+/// Only a regular local file is read, and only that file: nothing is fetched
+/// over the network and no DTD or external entity is loaded. A document with
+/// a document type declaration, or with elements nested more than 100 deep,
+/// is refused: the constructor throws host::ReportedError with a message
+/// naming the file. A document the parser built despite other errors (a file
+/// cut short, say) is used as it stands.
 class DocumentParse {
   public:
     enum class Platform { Initialize, AlreadyInitialized };
@@ -27,8 +34,8 @@ class DocumentParse {
     DocumentParse(const DocumentParse &) = delete;
     DocumentParse &operator=(const DocumentParse &) = delete;
 
-    /// The document, or null when the platform could not be initialised or
-    /// the parse gave no document.
+    /// The document, or null when the platform could not be initialised,
+    /// the path is not a regular file or the parse gave no document.
     xercesc::DOMDocument *Document() const { return document; }
 
   private:

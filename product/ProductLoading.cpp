@@ -152,7 +152,11 @@ LoadDescription(ProductReader &reader, const char *path, const char *option) {
     // out of this function, the thrown "Unknown product type" included.
     DocumentParse parse(path);
     const xercesc::DOMDocument *document = parse.Document();
-    if (document == nullptr)
+    // A file in which the parser found no element at all (an empty file,
+    // text or binary data) is no product description: not recognised,
+    // rather than a description of an unknown product type. Image files the
+    // host cannot read itself are offered here too.
+    if (document == nullptr || document->getDocumentElement() == nullptr)
         return nullptr;
     ProductType productType = ParseProductType(document);
     AcquisitionType acquisitionType = ParseAcquisitionType(document);

@@ -21,6 +21,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <limits>
 #include <vector>
 
 namespace {
@@ -53,11 +54,15 @@ struct TiePoints {
     }
 };
 
-// A positive size entry of the metadata, or 0 when absent or not positive.
+// A positive size entry of the metadata, read as atoi reads it, or 0 when
+// absent, not positive or beyond the 32-bit range (where atoi's result is
+// undefined): product.xml declares these sizes, and nothing bounds them.
 int32_t PositiveEntry(char *const *metadata, const char *key) {
     const char *text = FetchAuxEntry(metadata, key);
-    const int32_t value = text ? std::atoi(text) : 0;
-    return value > 0 ? value : 0;
+    const long value = text ? std::strtol(text, nullptr, 10) : 0;
+    return value > 0 && value <= std::numeric_limits<int32_t>::max()
+               ? static_cast<int32_t>(value)
+               : 0;
 }
 
 // Easting and northing of every tie point in the zone of utm; false when

@@ -1,0 +1,159 @@
+// The catalogue of broken products (tests/data/broken/cases.txt) run through
+// the rs2 tool, and the inputs too large to keep in the repository made here.
+
+#include "tests/broken/BrokenProduct.hpp"
+
+#include "host/RasterServices.hpp"
+
+#include "tests/support/CommandRun.hpp"
+#include "tests/support/TempDir.hpp"
+#include "tests/support/TestFiles.hpp"
+#include "tools/generator/ProductGenerator.hpp"
+
+#include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
+
+#include <filesystem>
+#include <fstream>
+#include <set>
+#include <string>
+#include <vector>
+
+namespace {
+
+namespace fs = std::filesystem;
+
+using rs2test::BrokenCase;
+using rs2test::CommandResult;
+using rs2test::ExpectOutcome;
+using rs2test::Quoted;
+using rs2test::RunRs2;
+
+const std::string kCatalogue = RS2_SOURCE_DIR "/tests/data/broken";
+
+std::string Calibrated(const std::string &folder) {
+    return Quoted(folder + "/product.xml?c=sigma");
+}
+
+TEST(BrokenProducts, every_catalogued_case_ends_as_its_manifest_line_says) {
+    const std::vector<BrokenCase> cases =
+        rs2test::ReadCatalogue(kCatalogue + "/cases.txt");
+    std::set<std::string> listed;
+    rs2test::TempDir root;
+    for (const BrokenCase &c : cases) {
+        SCOPED_TRACE(c.name + ": " + c.breaks);
+        listed.insert(c.name);
+        const std::string folder =
+            rs2test::PrepareCase(kCatalogue, c.name, root.Path());
+        {
+            SCOPED_TRACE("info");
+            ExpectOutcome(RunRs2("info " + Calibrated(folder)), c.info);
+        }
+        SCOPED_TRACE("export");
+        rs2test::TempDir out;
+        ExpectOutcome(RunRs2("export " + Calibrated(folder) + " " +
+                             Quoted(out.File("out.tif"))),
+                      c.exported);
+        const std::vector<std::string> left =
+            rs2test::FolderEntries(out.Path());
+        EXPECT_EQ(left, c.exported.exitCode == 0
+                            ? std::vector<std::string>{"out.tif"}
+                            : std::vector<std::string>{});
+    }
+    for (const auto &entry : fs::directory_iterator(kCatalogue)) {
+        if (entry.is_directory()) {
+            EXPECT_EQ(listed.count(entry.path().filename().string()), 1u)
+                << entry.path() << " has no line in cases.txt";
+        }
+    }
+}
+
+// The real samples of line 0 of a calibrated product, as `rs2 read --json`
+// gives them (null for an infinity or not a number).
+nlohmann::json FirstLine(const std::string &folder) {
+    const CommandResult run =
+        RunRs2("read " + Calibrated(folder) + " --window 0 0 " +
+               std::to_string(rs2test::kCaseWidth) + " 1 --real --json");
+    EXPECT_EQ(run.exitCode, 0) << run.errors;
+    return nlohmann::json::parse(run.output)["data"];
+}
+
+// Detected sample s of column x, line 0, calibrated with gain g: s * s / g.
+float CalibratedSample(int x, float gain) {
+    const float s = rs2gen::DetectedSample(rs2test::CaseOptions(), 0, x, 0);
+    return s * s / gain;
+}
+
+TEST(BrokenProducts,
+     zero_gains_give_infinite_pixels_and_negative_gains_negative_ones) {
+    rs2test::TempDir root;
+    const nlohmann::json alternating = FirstLine(rs2test::PrepareCase(
+        kCatalogue, "lut-zero-negative-gains", root.Path()));
+    const nlohmann::json words = FirstLine(
+        rs2test::PrepareCase(kCatalogue, "lut-non-numeric-gains", root.Path()));
+    ASSERT_EQ(alternating.size(), static_cast<size_t>(rs2test::kCaseWidth));
+    ASSERT_EQ(words.size(), static_cast<size_t>(rs2test::kCaseWidth));
+    for (int x = 0; x < rs2test::kCaseWidth; ++x) {
+        SCOPED_TRACE(x);
+        // Gains 0, -4, 0, -4, ...
+        if (x % 2 == 0)
+            EXPECT_TRUE(alternating[x].is_null());
+        else
+            EXPECT_FLOAT_EQ(alternating[x].get<float>(),
+                            CalibratedSample(x, -4.0f));
+        // Three words: three gains of 0, then the neutral gain past the end.
+        if (x < 3)
+            EXPECT_TRUE(words[x].is_null());
+        else
+            EXPECT_FLOAT_EQ(words[x].get<float>(), CalibratedSample(x, 1.0f));
+    }
+}
+
+TEST(BrokenProducts, a_table_of_three_million_gains_is_read_and_applied) {
+    rs2test::TempDir root;
+    const std::string folder =
+        rs2test::PrepareCase(kCatalogue, "lut-wrong-count", root.Path());
+    std::ofstream table(folder + "/lutSigma.xml", std::ios::trunc);
+    table << "<lut><offset>0</offset><gains>";
+    for (int i = 0; i < 3000000; ++i)
+        table << (i == 0 ? "" : " ") << (i % 2 == 0 ? "2" : "8");
+    table << "</gains></lut>\n";
+    table.close();
+    const nlohmann::json line = FirstLine(folder);
+    ASSERT_EQ(line.size(), static_cast<size_t>(rs2test::kCaseWidth));
+    for (int x = 0; x < rs2test::kCaseWidth; ++x)
+        EXPECT_FLOAT_EQ(line[x].get<float>(),
+                        CalibratedSample(x, x % 2 == 0 ? 2.0f : 8.0f))
+            << x;
+}
+
+TEST(BrokenProducts, a_grid_of_100000_tie_points_is_read_and_thinned) {
+    rs2test::TempDir root;
+    const std::string folder =
+        rs2test::PrepareCase(kCatalogue, "no-tie-points", root.Path());
+    std::string grid = "<geolocationGrid>";
+    // The 16 x 12 pixel positions, each given many times over.
+    for (int i = 0; i < 100000; ++i)
+        grid += "<imageTiePoint><imageCoordinate><line>" +
+                std::to_string(i / 400 % 12) + "</line><pixel>" +
+                std::to_string(i % 16) +
+                "</pixel></imageCoordinate><geodeticCoordinate><latitude>" +
+                std::to_string(49.2 - 1e-3 * (i / 400 % 12)) +
+                "</latitude><longitude>" +
+                std::to_string(-123.5 + 1e-3 * (i % 16)) +
+                "</longitude><height>0</height></geodeticCoordinate>"
+                "</imageTiePoint>";
+    grid += "</geolocationGrid>";
+    std::string withGrid = rs2test::FileText(folder + "/product.xml");
+    withGrid.insert(withGrid.find("<lookupTable"), grid);
+    rs2test::WriteFile(folder + "/product.xml", withGrid);
+
+    const CommandResult run = RunRs2("info --json " + Quoted(folder));
+    ASSERT_EQ(run.exitCode, 0) << run.errors;
+    const nlohmann::json info = nlohmann::json::parse(run.output);
+    EXPECT_EQ(info["gcps"]["points"].size(),
+              static_cast<size_t>(kMaxGcpSegmentPoints));
+    EXPECT_EQ(info["projection"]["geosys"], "UTM 10 U D000");
+}
+
+} // namespace
