@@ -3,6 +3,7 @@
 #include "host/RasterServices.hpp"
 
 #include <array>
+#include <cmath>
 #include <string>
 #include <vector>
 
@@ -36,6 +37,11 @@ std::vector<host::TiePoint> OutputTiePoints(const host::GcpSet &gcps,
         double y = gcp.y;
         if (!sameSystem && GCTPSimpleTransform(groundGeosys, gcp.x, gcp.y,
                                                fileGeosys.c_str(), &x, &y) != 0)
+            continue;
+        // A point the product gives without a finite position (not a number,
+        // infinite) georeferences nothing.
+        if (!std::isfinite(x) || !std::isfinite(y) || !std::isfinite(gcp.z) ||
+            !std::isfinite(gcp.pixel) || !std::isfinite(gcp.line))
             continue;
         ties.push_back({(gcp.pixel - plan.window.x) * columnScale,
                         (gcp.line - plan.window.y) * lineScale, x, y, gcp.z});

@@ -171,6 +171,12 @@ void PlanBackscatter(const host::Raster &raster, const ExportOptions &options,
 
 ExportPlan PlanExport(const host::Raster &raster,
                       const ExportOptions &options) {
+    if (raster.Width() < 1 || raster.Height() < 1 || raster.ChannelCount() < 1)
+        throw std::runtime_error("the dataset has no pixels to export (" +
+                                 std::to_string(raster.Width()) + " x " +
+                                 std::to_string(raster.Height()) + ", " +
+                                 std::to_string(raster.ChannelCount()) +
+                                 " channels)");
     ExportPlan plan;
     plan.window = CheckedWindow(raster, options.window);
     plan.gridWidth =
