@@ -14,6 +14,7 @@
 // each run. Arguments of Google Benchmark's form (--benchmark_...) are
 // ignored, so that bench/run can pass them to every benchmark.
 
+#include "bench/KeptProducts.hpp"
 #include "tools/generator/ProductGenerator.hpp"
 
 #include <tiffio.h>
@@ -49,29 +50,14 @@ struct RunResult {
     double peakAnonMiB = 0.0; // sampled RssAnon
 };
 
-fs::path BenchFolder() {
-    const char *chosen = std::getenv("RS2_BENCH_DIR");
-    return chosen != nullptr ? fs::path(chosen)
-                             : fs::temp_directory_path() / "rs2_bench";
-}
-
 // The product folder, generated when missing or incomplete.
-fs::path Product(const fs::path &folder) {
+fs::path Product() {
     rs2gen::ProductOptions options;
     options.productType = "SGF";
     options.polarizations = {"HH", "HV"};
     options.width = kSize;
     options.height = kSize;
-    const fs::path product = folder / "sgf_8000_hh_hv";
-    bool complete = fs::exists(product / "product.xml");
-    for (const std::string &pol : options.polarizations)
-        complete = complete && fs::exists(product / rs2gen::ImageFileName(pol));
-    if (!complete) {
-        std::printf("generating %s ...\n", product.c_str());
-        std::fflush(stdout);
-        rs2gen::GenerateProduct(product.string(), options);
-    }
-    return product;
+    return KeptProduct("sgf_8000_hh_hv", options);
 }
 
 // RssAnon of a process in MiB, or 0 when it cannot be read.
@@ -193,7 +179,7 @@ int main(int argc, char **argv) {
         const int repetitions = Repetitions(argc, argv);
         const fs::path folder = BenchFolder();
         fs::create_directories(folder);
-        const fs::path product = Product(folder);
+        const fs::path product = Product();
         Series rs2{"rs2 export ?c=sigma",
                    {RS2_TOOL, "export",
                     (product / "product.xml").string() + "?c=sigma",

@@ -28,20 +28,6 @@ bool Exists(const std::string &path) {
     return stat(path.c_str(), &info) == 0;
 }
 
-class PlatformHold {
-  public:
-    PlatformHold() : held(ORV_XMLUtil::Initialize() != 0) {}
-    ~PlatformHold() {
-        if (held)
-            ORV_XMLUtil::Terminate();
-    }
-    PlatformHold(const PlatformHold &) = delete;
-    PlatformHold &operator=(const PlatformHold &) = delete;
-
-  private:
-    bool held;
-};
-
 __attribute__((noinline)) void ParseBareWithTables(const std::string &folder) {
     for (const char *name : kParsedFiles) {
         xercesc::XercesDOMParser parser;
@@ -61,7 +47,7 @@ void BM_BareParseWithTables(benchmark::State &state) {
     const std::string folder = RealProductFolder();
     if (!Exists(folder + "/product.xml"))
         return state.SkipWithError("the real product is not there");
-    PlatformHold platform;
+    XmlPlatformHold platform;
     for (auto _ : state)
         ParseBareWithTables(folder);
 }
@@ -71,7 +57,7 @@ void BM_OpenAndDescribe(benchmark::State &state) {
     const std::string folder = RealProductFolder();
     if (!Exists(folder + "/product.xml"))
         return state.SkipWithError("the real product is not there");
-    PlatformHold platform;
+    XmlPlatformHold platform;
     for (auto _ : state)
         OpenAndDescribe(folder);
 }
@@ -81,7 +67,7 @@ void BM_OpenOnly(benchmark::State &state) {
     const std::string folder = RealProductFolder();
     if (!Exists(folder + "/product.xml"))
         return state.SkipWithError("the real product is not there");
-    PlatformHold platform;
+    XmlPlatformHold platform;
     for (auto _ : state) {
         const host::Raster raster = host::OpenRaster(folder + "/product.xml");
         benchmark::DoNotOptimize(raster.Width());
@@ -104,7 +90,7 @@ void BM_InfoOverBareParse(benchmark::State &state) {
     const std::string folder = RealProductFolder();
     if (!Exists(folder + "/product.xml"))
         return state.SkipWithError("the real product is not there");
-    PlatformHold platform;
+    XmlPlatformHold platform;
     double parse = 0, info = 0, ratio = 0;
     for (auto _ : state) {
         const double parseMs = MillisecondsOf(ParseBareWithTables, folder);

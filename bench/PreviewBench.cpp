@@ -10,6 +10,7 @@
 // large blocks are mapped and unmapped by the allocator on every read, so a
 // read cannot hide its memory in blocks an earlier one left behind.
 
+#include "bench/KeptProducts.hpp"
 #include "host/Raster.hpp"
 #include "tools/generator/ProductGenerator.hpp"
 
@@ -37,22 +38,14 @@ const std::vector<int32_t> kChannels = {1, 2, 3, 4};
 // The product folder ($RS2_BENCH_DIR, default $TMPDIR/rs2_bench), generated
 // when missing and kept for later runs.
 std::string ProductName() {
-    const char *chosen = std::getenv("RS2_BENCH_DIR");
-    const fs::path folder = chosen != nullptr
-                                ? fs::path(chosen)
-                                : fs::temp_directory_path() / "rs2_bench";
     rs2gen::ProductOptions options;
     options.productType = "SLC";
     options.polarizations = {"HH", "HV", "VH", "VV"};
     options.width = kWidth;
     options.height = kHeight;
-    const fs::path product = folder / "slc_4000x6000_quad";
-    bool complete = fs::exists(product / "product.xml");
-    for (const std::string &pol : options.polarizations)
-        complete = complete && fs::exists(product / rs2gen::ImageFileName(pol));
-    if (!complete)
-        rs2gen::GenerateProduct(product.string(), options);
-    return (product / "product.xml").string() + "?c=sigma";
+    return (KeptProduct("slc_4000x6000_quad", options) / "product.xml")
+               .string() +
+           "?c=sigma";
 }
 
 const host::Raster &Dataset() {

@@ -40,22 +40,6 @@ bool Exists(const std::string &path) {
     return stat(path.c_str(), &info) == 0;
 }
 
-// Holds the XML platform for a whole benchmark, so that neither side pays
-// for setting it up and tearing it down on every iteration.
-class PlatformHold {
-  public:
-    PlatformHold() : held(ORV_XMLUtil::Initialize() != 0) {}
-    ~PlatformHold() {
-        if (held)
-            ORV_XMLUtil::Terminate();
-    }
-    PlatformHold(const PlatformHold &) = delete;
-    PlatformHold &operator=(const PlatformHold &) = delete;
-
-  private:
-    bool held;
-};
-
 void ParseBare(const std::string &path,
                xercesc::XercesDOMParser::ValSchemes scheme) {
     xercesc::XercesDOMParser parser;
@@ -68,7 +52,7 @@ void BM_BareParseValidating(benchmark::State &state) {
     const std::string path = ProductPath();
     if (!Exists(path))
         return state.SkipWithError("product.xml not found");
-    PlatformHold platform;
+    XmlPlatformHold platform;
     for (auto _ : state)
         ParseBare(path, xercesc::XercesDOMParser::Val_Always);
 }
@@ -78,7 +62,7 @@ void BM_BareParseDefault(benchmark::State &state) {
     const std::string path = ProductPath();
     if (!Exists(path))
         return state.SkipWithError("product.xml not found");
-    PlatformHold platform;
+    XmlPlatformHold platform;
     for (auto _ : state)
         ParseBare(path, xercesc::XercesDOMParser::Val_Never);
 }
@@ -97,7 +81,7 @@ void BM_LoadProduct(benchmark::State &state) {
     const std::string path = ProductPath();
     if (!Exists(path))
         return state.SkipWithError("product.xml not found");
-    PlatformHold platform;
+    XmlPlatformHold platform;
     for (auto _ : state)
         LoadOnce(path);
 }
@@ -109,7 +93,7 @@ void BM_LoadProductSigma(benchmark::State &state) {
     const std::string path = ProductPath();
     if (!Exists(path))
         return state.SkipWithError("product.xml not found");
-    PlatformHold platform;
+    XmlPlatformHold platform;
     for (auto _ : state)
         LoadOnce(path, "sigma");
 }

@@ -21,6 +21,7 @@
 // (--benchmark_...) are ignored, so that bench/run can pass them. Exits 1
 // when a target is missed.
 
+#include "bench/KeptProducts.hpp"
 #include "bench/RealProduct.hpp"
 #include "host/Raster.hpp"
 #include "host/RasterHandle.hpp"
@@ -89,25 +90,13 @@ Footprint Measure() {
 
 // The generated product's description, written when missing or incomplete.
 std::string GeneratedProduct() {
-    const char *chosen = std::getenv("RS2_BENCH_DIR");
-    const fs::path folder = chosen != nullptr
-                                ? fs::path(chosen)
-                                : fs::temp_directory_path() / "rs2_bench";
     rs2gen::ProductOptions options;
     options.productType = "SGF";
     options.polarizations = {"HH", "HV"};
     options.width = kWidth;
     options.height = kHeight;
-    const fs::path product = folder / "sgf_2000x1500_hh_hv";
-    bool complete = fs::exists(product / "product.xml");
-    for (const std::string &pol : options.polarizations)
-        complete = complete && fs::exists(product / rs2gen::ImageFileName(pol));
-    if (!complete) {
-        std::printf("generating %s ...\n", product.c_str());
-        std::fflush(stdout);
-        rs2gen::GenerateProduct(product.string(), options);
-    }
-    return (product / "product.xml").string();
+    return (KeptProduct("sgf_2000x1500_hh_hv", options) / "product.xml")
+        .string();
 }
 
 // One cycle; returns a figure of what it read so that none of it is idle.

@@ -19,18 +19,6 @@ namespace {
 
 using xercesc::DOMElement;
 
-// Holds the XML platform for as long as a parse needs it.
-class XmlPlatform {
-  public:
-    XmlPlatform() {
-        if (ORV_XMLUtil::Initialize() == 0)
-            throw std::runtime_error("the XML parser cannot be started");
-    }
-    ~XmlPlatform() { ORV_XMLUtil::Terminate(); }
-    XmlPlatform(const XmlPlatform &) = delete;
-    XmlPlatform &operator=(const XmlPlatform &) = delete;
-};
-
 // The annotation has been parsed once already by the driver; this parse
 // still loads nothing from outside the text and expands no entity
 // recursively.
@@ -154,7 +142,9 @@ double NoiseLevels::PowerAt(double column) const {
 
 NoiseLevels ReadNoiseLevels(const std::string &annotation,
                             const std::string &calibration) {
-    XmlPlatform platform;
+    const XmlPlatformHold platform;
+    if (!platform.Held())
+        throw std::runtime_error("the XML parser cannot be started");
     xercesc::SecurityManager security;
     security.setEntityExpansionLimit(100);
     const std::unique_ptr<xercesc::XercesDOMParser> parser =
