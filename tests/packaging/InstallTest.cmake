@@ -138,9 +138,20 @@ endif()
 run(ignored ${prefix}/bin/rs2 sample ${product})
 
 # The example through find_package(rs2), in a fresh build tree.
+# A sanitized build installs sanitized libraries, which only programs built
+# with the same sanitizers can load.
+set(sanitize_flags "")
+if(SANITIZE)
+    string(REPLACE "," ";" sanitizers "${SANITIZE}")
+    foreach(sanitizer IN LISTS sanitizers)
+        list(APPEND sanitize_flags -fsanitize=${sanitizer})
+    endforeach()
+endif()
+string(REPLACE ";" " " sanitize_text "${sanitize_flags}")
 run(ignored ${CMAKE_COMMAND} -S ${example_source} -B ${scratch}/example
     -DCMAKE_PREFIX_PATH=${prefix} -DCMAKE_CXX_COMPILER=${CXX_COMPILER}
-    -DCMAKE_BUILD_TYPE=Release)
+    -DCMAKE_BUILD_TYPE=Release "-DCMAKE_CXX_FLAGS=${sanitize_text}"
+    "-DCMAKE_EXE_LINKER_FLAGS=${sanitize_text}")
 file(STRINGS ${scratch}/example/CMakeCache.txt found REGEX "^rs2_DIR:")
 expect_contains("${found}" "=${prefix}/${LIBDIR}/cmake/rs2" "rs2_DIR")
 run(ignored ${CMAKE_COMMAND} --build ${scratch}/example)
@@ -153,7 +164,7 @@ run(cflags ${PKG_CONFIG} --cflags rs2-host)
 run(libs ${PKG_CONFIG} --libs rs2-host)
 separate_arguments(cflags UNIX_COMMAND "${cflags}")
 separate_arguments(libs UNIX_COMMAND "${libs}")
-run(ignored ${CXX_COMPILER} -std=c++17 ${cflags}
+run(ignored ${CXX_COMPILER} -std=c++17 ${sanitize_flags} ${cflags}
     ${example_source}/OpenProduct.cpp ${libs} -Wl,-rpath,${prefix}/${LIBDIR}
     -o ${scratch}/open_product_pc)
 run(report_pc ${scratch}/open_product_pc ${product})
