@@ -10,7 +10,6 @@
 #include "product/DescriptionFacts.hpp"
 #include "product/DocumentAccess.hpp"
 
-
 #include <memory>
 #include <optional>
 #include <string>
