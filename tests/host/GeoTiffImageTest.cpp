@@ -28,7 +28,7 @@ using host::GeoTiffImage;
 using host::ReportedError;
 using host::WindowRequest;
 using rs2test::TempDir;
-using rs2test::TiffSpec;
+using rs2test::TiffShape;
 
 constexpr uint32_t kWidth = 37;  // not a multiple of the 16-pixel tiles
 constexpr uint32_t kHeight = 29; // nor of the strip heights used
@@ -105,8 +105,8 @@ const LayoutCase kLayouts[] = {
 };
 // clang-format on
 
-TiffSpec SpecFor(const FormatCase &format, const LayoutCase &layout) {
-    TiffSpec spec;
+TiffShape SpecFor(const FormatCase &format, const LayoutCase &layout) {
+    TiffShape spec;
     spec.width = kWidth;
     spec.height = kHeight;
     spec.samplesPerPixel = 2;
@@ -331,7 +331,7 @@ TEST(GeoTiffImage, refuses_files_it_cannot_decode) {
     TempDir dir;
     for (const Case &c : cases) {
         SCOPED_TRACE(c.what);
-        TiffSpec spec;
+        TiffShape spec;
         spec.width = 16;
         spec.height = 16;
         spec.bitsPerSample = c.bitsPerSample;
@@ -381,7 +381,7 @@ std::string LittleEndian32(uint64_t value) {
 TEST(GeoTiffImage, missing_uncompressed_strip_is_refused_before_writing) {
     TempDir dir;
     const std::string path = dir.File("short.tif");
-    TiffSpec spec;
+    TiffShape spec;
     spec.width = 10;
     spec.height = 8;
     spec.bitsPerSample = 8;
@@ -466,7 +466,7 @@ TEST(GeoTiffImage, georeferencing_gives_the_system_transform_and_tie_points) {
     TempDir dir;
     for (const Case &c : cases) {
         SCOPED_TRACE(c.what);
-        TiffSpec spec = SpecFor(kUInt8, kLayouts[0]);
+        TiffShape spec = SpecFor(kUInt8, kLayouts[0]);
         spec.geoKeys = c.keys;
         spec.pixelScale = c.pixelScale;
         spec.tiePoints = c.tiePoints;
@@ -511,7 +511,7 @@ std::vector<double> RpcValues() {
 
 std::unique_ptr<GeoTiffImage> OpenWithRpc(const TempDir &dir,
                                           const std::vector<double> &values) {
-    TiffSpec spec = SpecFor(kUInt16, kLayouts[0]);
+    TiffShape spec = SpecFor(kUInt16, kLayouts[0]);
     spec.rpcCoefficients = values;
     const std::string path = dir.File("rpc.tif");
     rs2test::WriteTiff(path, spec, kUInt16.Values());

@@ -205,7 +205,7 @@ TEST(ChannelReading,
     options.tiePoints = false;
     // The generator's image replaced by one holding the cases, pixel by pixel.
     LoadedProduct loaded(options, nullptr, [&](const auto &product) {
-        rs2test::TiffSpec layout;
+        rs2test::TiffShape layout;
         layout.width = 2;
         layout.height = 2;
         layout.samplesPerPixel = 2;

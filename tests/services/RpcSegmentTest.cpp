@@ -49,7 +49,7 @@ RecordKeeper Decode(const std::vector<unsigned char> &block) {
 // size carrying the georeferencing of spec.
 void ReplaceImage(const rs2gen::GeneratedProduct &product,
                   const rs2gen::ProductOptions &options,
-                  rs2test::TiffSpec spec) {
+                  rs2test::TiffShape spec) {
     spec.width = static_cast<uint32_t>(options.width);
     spec.height = static_cast<uint32_t>(options.height);
     rs2test::WriteTiff(product.imageFiles[0], spec,
@@ -59,8 +59,8 @@ void ReplaceImage(const rs2gen::GeneratedProduct &product,
 }
 
 // North-up in UTM zone 10 north (EPSG 32610), 10 m pixels.
-rs2test::TiffSpec UtmImage() {
-    rs2test::TiffSpec spec;
+rs2test::TiffShape UtmImage() {
+    rs2test::TiffShape spec;
     spec.geoKeys = {1024, 1, 1025, 1, 3072, 32610};
     spec.pixelScale = {10.0, 10.0, 0.0};
     spec.tiePoints = {0.0, 0.0, 0.0, 480000.0, 5450000.0, 0.0};
@@ -68,8 +68,8 @@ rs2test::TiffSpec UtmImage() {
 }
 
 // No georeferencing, but an RPC model of its own (every value non-zero).
-rs2test::TiffSpec ImageWithRpc() {
-    rs2test::TiffSpec spec;
+rs2test::TiffShape ImageWithRpc() {
+    rs2test::TiffShape spec;
     for (int i = 0; i < 92; ++i)
         spec.rpcCoefficients.push_back(i + 1.5);
     return spec;

@@ -66,7 +66,7 @@ std::vector<uint16_t> KeyDirectory(const std::vector<uint16_t> &pairs) {
     return directory;
 }
 
-void SetLayoutFields(TIFF *tif, const TiffSpec &spec) {
+void SetLayoutFields(TIFF *tif, const TiffShape &spec) {
     // BitsPerSample before SampleFormat: libtiff picks the byte swapping of
     // complex samples from both, in that order.
     TIFFSetField(tif, TIFFTAG_IMAGEWIDTH, spec.width);
@@ -90,7 +90,7 @@ void SetLayoutFields(TIFF *tif, const TiffSpec &spec) {
     }
 }
 
-void SetGeoFields(TIFF *tif, const TiffSpec &spec) {
+void SetGeoFields(TIFF *tif, const TiffShape &spec) {
     DefineGeoTags(tif);
     SetArrayField(tif, kGeoPixelScaleTag, spec.pixelScale);
     SetArrayField(tif, kGeoTiePointsTag, spec.tiePoints);
@@ -139,7 +139,7 @@ struct BlockPlace {
 
 class BlockFiller {
   public:
-    explicit BlockFiller(const TiffSpec &specIn) : spec(specIn) {
+    explicit BlockFiller(const TiffShape &specIn) : spec(specIn) {
         const bool complex = spec.sampleFormat == SAMPLEFORMAT_COMPLEXINT ||
                              spec.sampleFormat == SAMPLEFORMAT_COMPLEXIEEEFP;
         elementsPerSample = complex ? 2 : 1;
@@ -174,7 +174,7 @@ class BlockFiller {
     }
 
   private:
-    const TiffSpec &spec;
+    const TiffShape &spec;
     uint32_t elementsPerSample = 1;
     Storer store = nullptr;
     uint32_t elementBytes = 0;
@@ -185,7 +185,7 @@ class BlockFiller {
 // Writes every strip or tile in libtiff's numbering: plane by plane, row
 // by row. A strip is a block as wide as the image; tiles are whole at the
 // image edges, while the last strip holds only the lines left.
-void WriteBlocks(TIFF *tif, const TiffSpec &spec, const ElementValue &value) {
+void WriteBlocks(TIFF *tif, const TiffShape &spec, const ElementValue &value) {
     const BlockFiller filler(spec);
     const bool tiled = spec.tileSize > 0;
     const uint32_t blockWidth = tiled ? spec.tileSize : spec.width;
@@ -217,7 +217,7 @@ void WriteBlocks(TIFF *tif, const TiffSpec &spec, const ElementValue &value) {
 
 } // namespace
 
-void WriteTiff(const std::string &path, const TiffSpec &spec,
+void WriteTiff(const std::string &path, const TiffShape &spec,
                const ElementValue &value) {
     TiffOwner tif(TIFFOpen(path.c_str(), spec.bigEndian ? "wb" : "wl"));
     if (!tif)

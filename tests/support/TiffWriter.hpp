@@ -10,7 +10,7 @@
 namespace rs2test {
 
 /// How a test TIFF stores its samples, and the georeferencing it carries.
-struct TiffSpec {
+struct TiffShape {
     uint32_t width = 0;  // pixels
     uint32_t height = 0; // lines
     uint16_t samplesPerPixel = 1;
@@ -42,7 +42,7 @@ using ElementValue =
 /// refuses. Layouts whose elements are not whole bytes, or whose blocks
 /// libtiff sizes differently (subsampled YCbCr), are written as zeros:
 /// tests only use such files to see them refused.
-void WriteTiff(const std::string &path, const TiffSpec &spec,
+void WriteTiff(const std::string &path, const TiffShape &spec,
                const ElementValue &value);
 
 /// The (offset, byte count) of every strip or tile of the file at path, in

@@ -231,7 +231,7 @@ TEST(QuicklookCommand, stretches_the_power_in_decibels_between_percentiles) {
 TEST(QuicklookCommand, shows_a_constant_image_mid_grey_and_no_data_black) {
     const rs2test::TempDir folder;
     const std::string tiff = folder.File("power.tif");
-    rs2test::TiffSpec spec;
+    rs2test::TiffShape spec;
     spec.width = 8;
     spec.height = 4;
     spec.bitsPerSample = 32;
