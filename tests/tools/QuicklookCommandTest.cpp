@@ -287,4 +287,13 @@ TEST(QuicklookCommand, fails_with_exit_1_and_leaves_no_partial_file) {
     std::string text;
     kept >> text;
     EXPECT_EQ(text, "old");
+    // An image the product names is missing: its channel would be black.
+    fs::remove(fs::path(product.folder.Path()) / "imagery_HV.tif");
+    const CommandResult missing = Quicklook(Quoted(product.xml) + " " +
+                                            Quoted(product.out.File("m.png")));
+    EXPECT_EQ(missing.exitCode, 1);
+    EXPECT_NE(missing.errors.find("not every pixel could be read"),
+              std::string::npos)
+        << missing.errors;
+    EXPECT_EQ(EntryCount(product.out.Path()), 1u);
 }

@@ -1,8 +1,11 @@
 #include "tools/rs2/DatasetChoice.hpp"
 
+#include "host/ErrorReports.hpp"
+
 #include <algorithm>
 #include <cctype>
 #include <numeric>
+#include <stdexcept>
 
 namespace {
 
@@ -62,4 +65,13 @@ std::vector<int32_t> ChosenChannels(const host::Raster &raster,
                             " does not exist (the dataset has " +
                             std::to_string(raster.ChannelCount()) + ")");
     return channels;
+}
+
+void ForgetOpenWarnings() { host::ClearWarnings(); }
+
+void RequireCompleteReads() {
+    const std::vector<std::string> warnings = host::Warnings();
+    if (!warnings.empty())
+        throw std::runtime_error("not every pixel could be read: " +
+                                 warnings.front());
 }

@@ -26,3 +26,11 @@ std::string NameWithCalibration(const std::string &name,
 std::vector<int32_t> ChosenChannels(const host::Raster &raster,
                                     std::vector<int32_t> channels,
                                     const std::string &option = "--channels");
+
+// Pixels the driver cannot read (an image file that is missing, or is not an
+// image) stay as they were in the buffer, and the host logs a warning. A
+// command that writes a file from its reads forgets the open's warnings once
+// opened (ForgetOpenWarnings) and calls RequireCompleteReads after reading,
+// so that it fails rather than pass zeros off as the product's pixels.
+void ForgetOpenWarnings();
+void RequireCompleteReads();

@@ -114,15 +114,16 @@ void ReadBand(const host::Raster &raster, const ExportPlan &plan,
               int32_t firstRow, int32_t rows, BandBuffer &band) {
     if (plan.gridHeight == plan.window.height) {
         band.Read(raster, SourceRow(plan, firstRow), rows, rows, 0);
-        return;
+    } else {
+        for (int32_t i = 0; i < rows; ++i) {
+            const int32_t source = SourceRow(plan, firstRow + i);
+            if (i > 0 && source == SourceRow(plan, firstRow + i - 1))
+                band.CopyRow(i - 1, i);
+            else
+                band.Read(raster, source, 1, 1, i);
+        }
     }
-    for (int32_t i = 0; i < rows; ++i) {
-        const int32_t source = SourceRow(plan, firstRow + i);
-        if (i > 0 && source == SourceRow(plan, firstRow + i - 1))
-            band.CopyRow(i - 1, i);
-        else
-            band.Read(raster, source, 1, 1, i);
-    }
+    RequireCompleteReads();
 }
 
 // Band height: whole strips of the file, about kBandBytes.
@@ -220,6 +221,7 @@ void WriteBackscatter(const host::Raster &raster, const ExportPlan &plan,
 void RunExport(ExportOptions options) {
     options.name = NameWithCalibration(options.name, options.calibration);
     host::Raster raster = host::OpenRaster(options.name);
+    ForgetOpenWarnings();
     const ExportPlan plan = PlanExport(raster, options);
     const host::GeoTiffGeoreferencing geo = OutputGeoreferencing(raster, plan);
     PartFile part(options.output);
@@ -290,7 +292,9 @@ void AddExportCommand(CLI::App &app) {
         "samples they hold) and scales the georeferencing to match. The "
         "steps apply in this order: power, noise, looks, dB.\n"
         "The file is written as OUT.part-XXXXXX beside OUT and renamed when "
-        "complete; nothing is left behind on failure.\n"
+        "complete; nothing is left behind on failure. A channel whose image "
+        "file is missing or unreadable fails the export rather than be "
+        "written as zeros.\n"
         "Examples:\n"
         "  rs2 export 'dir/product.xml?c=sigma' sigma0.tif\n"
         "  rs2 export dir sigma0_db.tif --calibration sigma --denoise --db\n"

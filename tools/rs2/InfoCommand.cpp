@@ -3,6 +3,7 @@
 #include "tools/rs2/DatasetJson.hpp"
 
 #include <cstdio>
+#include <filesystem>
 #include <iostream>
 
 namespace {
@@ -31,10 +32,18 @@ void RowsFromEntries(
         Row(label, Entry(info, key));
 }
 
-std::string Join(const json &list, const char *separator) {
+// The file lists name what product.xml names, present or not; a reader
+// should see at once that an image is missing (its channel reads nothing).
+std::string FileText(const std::string &path) {
+    std::error_code error;
+    return std::filesystem::is_regular_file(path, error) ? path
+                                                         : path + " (missing)";
+}
+
+std::string JoinFiles(const json &list) {
     std::string text;
     for (const auto &item : list)
-        text += (text.empty() ? "" : separator) + item.get<std::string>();
+        text += (text.empty() ? "" : ", ") + FileText(item);
     return text;
 }
 
@@ -94,9 +103,10 @@ void PrintSummary(const json &info) {
         Row(std::to_string(segment["type"].get<int>()),
             segment["description"].get<std::string>());
     Heading("Files");
-    Row("images", Join(info["files"]["images"], ", "));
-    Row("browse", info["files"]["browse"]);
-    Row("auxiliary", Join(info["files"]["auxiliary"], ", "));
+    Row("images", JoinFiles(info["files"]["images"]));
+    const std::string browse = info["files"]["browse"];
+    Row("browse", browse.empty() ? browse : FileText(browse));
+    Row("auxiliary", JoinFiles(info["files"]["auxiliary"]));
     for (const auto &warning : info["warnings"])
         std::printf("warning: %s\n", warning.get<std::string>().c_str());
 }

@@ -152,6 +152,7 @@ class BandReader {
                                  count);
             PowerFromWords(words.data(), pixels, 1, rule, power);
         }
+        RequireCompleteReads();
     }
 
   private:
@@ -278,6 +279,7 @@ const ChannelPreview &PreviewOf(const std::vector<ChannelPreview> &previews,
 void RunQuicklook(const QuicklookOptions &options) {
     host::Raster raster = host::OpenRaster(
         NameWithCalibration(options.name, options.calibration));
+    ForgetOpenWarnings();
     const std::vector<int32_t> shown = ShownChannels(raster, options);
     const PreviewSize size =
         FittedSize(raster.Width(), raster.Height(), options.maxSize);
