@@ -2,8 +2,12 @@
 
 #include "host/StringLists.hpp"
 
+#include <cstddef>
 #include <cstdlib>
 #include <memory>
+#include <optional>
+#include <string>
+#include <unordered_map>
 
 /// Releases a host allocation (host texts come from the C heap).
 struct HostFree {
@@ -12,14 +16,19 @@ struct HostFree {
 /// A host text owned from the line that receives it.
 using HostText = std::unique_ptr<char, HostFree>;
 
-/// Owns a host key/value list while it is being built. Every changing host
-/// call may move the list, so the keeper always holds the pointer the last
-/// call returned; a host call that throws leaves the previous list intact,
-/// and the keeper destroys it.
+/// Owns a host key/value list while it is being built, with the host's
+/// meaning of every call (Set replaces the first entry of a key, or appends).
+/// A host call that throws leaves the list as it was, and the keeper
+/// destroys it.
+///
+/// A product's metadata is built entry by entry from documents of any size;
+/// the keeper finds the first entry of a key through an index and grows the
+/// array by doubling, so that building n entries costs O(n), not the O(n^2)
+/// of searching and reallocating the host list on every call.
 class StringListKeeper {
   public:
     StringListKeeper() = default;
-    explicit StringListKeeper(char **listIn) : list(listIn) {}
+    explicit StringListKeeper(char **listIn) { Reset(listIn); }
     ~StringListKeeper() { DestroyStringList(list); }
     StringListKeeper(const StringListKeeper &) = delete;
     StringListKeeper &operator=(const StringListKeeper &) = delete;
@@ -27,32 +36,30 @@ class StringListKeeper {
     /// The list as it stands (null while it holds nothing); still owned here.
     char **Get() const { return list; }
     /// Takes listIn in place of the list held so far, which is destroyed.
-    void Reset(char **listIn) {
-        if (listIn != list)
-            DestroyStringList(list);
-        list = listIn;
-    }
+    void Reset(char **listIn);
     /// Hands the list over; the caller destroys it with DestroyStringList.
-    char **Release() {
-        char **out = list;
-        list = nullptr;
-        return out;
-    }
+    char **Release();
 
     /// Value of the first entry of key (pointing into the list), or null.
-    const char *Fetch(const char *key) const {
-        return FetchAuxEntry(list, key);
-    }
-    void Set(const char *key, const char *value) {
-        list = SetAuxEntry(list, key, value);
-    }
+    const char *Fetch(const char *key) const;
+    void Set(const char *key, const char *value);
     /// Removes every entry of key.
-    void Delete(const char *key) {
-        list = DeleteAuxEntries(list, key, nullptr, 1);
-    }
+    void Delete(const char *key);
     /// Appends copies of the texts of other.
-    void Append(char *const *other) { list = AddStringList(list, other); }
+    void Append(char *const *other);
 
   private:
+    std::optional<std::size_t> FirstEntry(const std::string &key) const;
+    void IndexNewEntries() const;
+    void ForgetIndex();
+    void Recount();
+    void MakeRoom(std::size_t texts);
+
     char **list = nullptr;
+    std::size_t count = 0;    // texts in the list
+    std::size_t capacity = 0; // slots the array has, the terminator's included
+    // The first entry of every key that holds no ": ", for the entries
+    // [0, indexed); the rest are indexed when a key is next looked up.
+    mutable std::unordered_map<std::string, std::size_t> firstEntries;
+    mutable std::size_t indexed = 0;
 };
