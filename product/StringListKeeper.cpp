@@ -3,6 +3,7 @@
 #include "host/TextServices.hpp"
 
 #include <algorithm>
+#include <cstdlib>
 #include <cstring>
 #include <new>
 #include <vector>

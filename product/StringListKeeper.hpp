@@ -1,20 +1,14 @@
 #pragma once
 
+#include "host/HostMemory.hpp"
 #include "host/StringLists.hpp"
 
 #include <cstddef>
-#include <cstdlib>
-#include <memory>
 #include <optional>
 #include <string>
 #include <unordered_map>
 
-/// Releases a host allocation (host texts come from the C heap).
-struct HostFree {
-    void operator()(void *memory) const { std::free(memory); }
-};
-/// A host text owned from the line that receives it.
-using HostText = std::unique_ptr<char, HostFree>;
+using host::HostText;
 
 /// Owns a host key/value list while it is being built, with the host's
 /// meaning of every call (Set replaces the first entry of a key, or appends).
