@@ -20,11 +20,12 @@
 //
 // A refused request writes nothing: the window, sizes and channels are
 // checked before the first byte is written. So does a decoding failure:
-// uncompressed blocks are checked to lie inside the file before writing, and
-// compressed ones (whose data can turn out corrupt midway) are converted into
-// a scratch copy of the output that reaches dst only once every block
-// decoded. Only a file changed on disk during the read can still leave dst
-// partly written.
+// the blocks are checked to lie inside the file before anything is
+// allocated or written (compressed ones also to store enough bytes for their
+// declared size), and compressed ones (whose data can turn out corrupt
+// midway) are converted into a scratch copy of the output that reaches dst
+// only once every block decoded. Only a file changed on disk during the read
+// can still leave dst partly written.
 //
 // Conversions: to float, every value as the nearest float; to int32, integers
 // as they are (uint32 values above INT32_MAX clamp to it), floats rounded to
@@ -276,9 +277,9 @@ void GeoTiffImage::State::Read(const WindowRequest &window,
     CheckRequest(file.Path(), layout, window, channels, dst);
     try {
         const WindowPlan plan = MakePlan(layout, window, channels);
+        cache.CheckStoredInFile(NeededBlockRows(layout, plan),
+                                plan.neededPlanes, plan.neededColumns);
         if (!layout.compressed) {
-            cache.CheckStoredInFile(NeededBlockRows(layout, plan),
-                                    plan.neededPlanes, plan.neededColumns);
             CopyWindowOfType(cache, layout, window, plan, dst);
             return;
         }

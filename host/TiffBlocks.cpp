@@ -13,6 +13,13 @@ namespace {
 // than this is refused instead of allocated.
 constexpr uint64_t kMaxBlockRowBytes = uint64_t(1) << 30;
 
+// How far compressed data can expand: PackBits 64 times, LZW and Deflate
+// about 1400 and 1030 times, runs of one byte in zstd some 30,000 times. A
+// compressed block declaring more than this many times the bytes it stores
+// is refused before anything is allocated for it, so that a tiny file cannot
+// claim hundreds of megabytes.
+constexpr uint64_t kMaxExpansion = uint64_t(1) << 16;
+
 struct SampleFormatEntry {
     uint16_t format;
     uint16_t bitsPerSample;
@@ -260,10 +267,16 @@ void TiffBlockCache::CheckBlockStored(uint32_t plane, uint32_t blockRow,
     int failed = 0;
     const uint64_t offset = TIFFGetStrileOffsetWithErr(tif, index, &failed);
     const uint64_t stored = TIFFGetStrileByteCountWithErr(tif, index, &failed);
-    if (failed || stored < layout.DecodedBytes(blockRow) || offset > fileSize ||
-        stored > fileSize - offset)
+    const uint64_t decoded = layout.DecodedBytes(blockRow);
+    const bool inFile =
+        !failed && offset <= fileSize && stored <= fileSize - offset;
+    if (!inFile || (!layout.compressed && stored < decoded))
         file.Fail(BlockName(layout, index) +
                   " lies beyond the end of the file");
+    if (layout.compressed && (stored == 0 || decoded / kMaxExpansion > stored))
+        file.Fail(BlockName(layout, index) + " stores " +
+                  std::to_string(stored) + " bytes, too few to hold the " +
+                  std::to_string(decoded) + " it declares");
 }
 
 } // namespace host

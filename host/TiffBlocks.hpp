@@ -71,8 +71,9 @@ class TiffBlockCache {
                               const std::vector<bool> &neededColumns);
 
     /// Throws host::ReportedError unless every flagged block of the given
-    /// rows and planes lies whole inside the file. For uncompressed data
-    /// this is what decoding them needs, short of an I/O error.
+    /// rows and planes lies whole inside the file and, when compressed,
+    /// stores enough bytes to expand to its declared size. For uncompressed
+    /// data this is what decoding them needs, short of an I/O error.
     void CheckStoredInFile(const std::vector<uint32_t> &blockRows,
                            const std::vector<bool> &neededPlanes,
                            const std::vector<bool> &neededColumns) const;

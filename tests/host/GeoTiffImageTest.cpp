@@ -8,6 +8,7 @@
 #include "tests/support/TiffWriter.hpp"
 
 #include <gtest/gtest.h>
+#include <tiffio.h>
 
 #include <algorithm>
 #include <array>
@@ -402,6 +403,57 @@ TEST(GeoTiffImage, missing_uncompressed_strip_is_refused_before_writing) {
     std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
     ExpectWindow(*image, value, ExpectedInt, {0, 0, 10, 4, 10, 4}, {1});
     ExpectReadFailsWritingNothing(*image, {0, 0, 10, 8, 10, 8}, {1});
+}
+
+// A Deflate file of one strip of width x height 8-bit samples that stores
+// only `stored` bytes of compressed data.
+void WriteDeflateStrip(const std::string &path, uint32_t width, uint32_t height,
+                       const std::string &stored) {
+    TIFF *tif = TIFFOpen(path.c_str(), "w");
+    ASSERT_NE(tif, nullptr);
+    TIFFSetField(tif, TIFFTAG_IMAGEWIDTH, width);
+    TIFFSetField(tif, TIFFTAG_IMAGELENGTH, height);
+    TIFFSetField(tif, TIFFTAG_BITSPERSAMPLE, 8);
+    TIFFSetField(tif, TIFFTAG_SAMPLESPERPIXEL, 1);
+    TIFFSetField(tif, TIFFTAG_PHOTOMETRIC, PHOTOMETRIC_MINISBLACK);
+    TIFFSetField(tif, TIFFTAG_COMPRESSION, COMPRESSION_ADOBE_DEFLATE);
+    TIFFSetField(tif, TIFFTAG_ROWSPERSTRIP, height);
+    std::string data = stored;
+    TIFFWriteRawStrip(tif, 0, data.data(), static_cast<tmsize_t>(data.size()));
+    TIFFClose(tif);
+}
+
+TEST(GeoTiffImage, compressed_strip_too_small_for_its_size_is_refused) {
+    TempDir dir;
+    // 40 bytes that would have to expand to 800 MB: refused before anything
+    // is allocated for the strip.
+    const std::string claimed = dir.File("claimed.tif");
+    WriteDeflateStrip(claimed, 800, 1000000, std::string(40, 'x'));
+    std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(claimed);
+    try {
+        std::vector<float> values(800);
+        image->ReadReal32({0, 0, 800, 1, 800, 1}, {1}, values.data());
+        ADD_FAILURE() << "read a strip that cannot hold its size";
+    } catch (const ReportedError &error) {
+        EXPECT_NE(std::string(error.what()).find("too few to hold"),
+                  std::string::npos)
+            << error.what();
+    }
+    // Zeros compress about a thousand times: such a strip is read.
+    const std::string zeros = dir.File("zeros.tif");
+    TiffShape spec;
+    spec.width = 2000;
+    spec.height = 2000;
+    spec.bitsPerSample = 8;
+    spec.rowsPerStrip = 2000;
+    spec.compression = COMPRESSION_ADOBE_DEFLATE;
+    const rs2test::ElementValue zero = [](uint32_t, uint32_t, uint32_t) {
+        return 0.0;
+    };
+    rs2test::WriteTiff(zeros, spec, zero);
+    ASSERT_LT(std::filesystem::file_size(zeros), 2000u * 2000u / 500u);
+    ExpectWindow(*GeoTiffImage::Open(zeros), zero, ExpectedInt,
+                 {0, 1990, 2000, 10, 2000, 10}, {1});
 }
 
 // GeoKeyDirectory entries (key, value) of the georeferencing cases.
