@@ -441,16 +441,16 @@ TEST(GeoTiffImage, compressed_strip_too_small_for_its_size_is_refused) {
     }
     // Zeros compress about a thousand times: such a strip is read.
     const std::string zeros = dir.File("zeros.tif");
-    TiffShape spec;
-    spec.width = 2000;
-    spec.height = 2000;
-    spec.bitsPerSample = 8;
-    spec.rowsPerStrip = 2000;
-    spec.compression = COMPRESSION_ADOBE_DEFLATE;
+    TiffShape shape;
+    shape.width = 2000;
+    shape.height = 2000;
+    shape.bitsPerSample = 8;
+    shape.rowsPerStrip = 2000;
+    shape.compression = COMPRESSION_ADOBE_DEFLATE;
     const rs2test::ElementValue zero = [](uint32_t, uint32_t, uint32_t) {
         return 0.0;
     };
-    rs2test::WriteTiff(zeros, spec, zero);
+    rs2test::WriteTiff(zeros, shape, zero);
     ASSERT_LT(std::filesystem::file_size(zeros), 2000u * 2000u / 500u);
     ExpectWindow(*GeoTiffImage::Open(zeros), zero, ExpectedInt,
                  {0, 1990, 2000, 10, 2000, 10}, {1});
