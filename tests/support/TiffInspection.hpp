@@ -7,8 +7,8 @@
 
 namespace rs2test {
 
-/// The values of a counted double tag (pixel scale, tie points, matrix);
-/// empty when the file lacks it.
+/// The doubles a georeferencing tag holds (pixel scale, tie points,
+/// transformation matrix); none when the file has no such tag.
 inline std::vector<double> DoubleArray(TIFF *tiff, ttag_t tag) {
     uint16_t count = 0;
     double *values = nullptr;
@@ -17,7 +17,7 @@ inline std::vector<double> DoubleArray(TIFF *tiff, ttag_t tag) {
     return std::vector<double>(values, values + count);
 }
 
-/// A one-value SHORT GeoKey, or -1 when it is absent.
+/// The 16-bit value of a GeoKey, or -1 when the file has no such key.
 inline int ShortKey(GTIF *gtif, geokey_t key) {
     unsigned short value = 0;
     return GTIFKeyGetSHORT(gtif, key, &value, 0, 1) == 1 ? value : -1;
