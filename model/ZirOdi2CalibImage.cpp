@@ -2,14 +2,15 @@
 
 #include "host/ErrorReports.hpp"
 #include "host/Exception.hpp"
+#include "host/GeoTiffImage.hpp"
 #include "host/RasterServices.hpp"
 #include "host/StringLists.hpp"
 #include "host/TextServices.hpp"
 #include "host/fileio/File.hpp"
+#include "model/ProductFolder.hpp"
 
 #include <cstdlib>
 #include <cstring>
-#include <set>
 #include <string>
 
 namespace {
@@ -38,42 +39,48 @@ bool CopyTieArray(double *&target, const double *source, int32_t count) {
     return true;
 }
 
-// Image paths whose VXBOpen is under way. An image file name that leads back
-// to a product being opened (its own product.xml, or a ring of products
-// naming each other) would otherwise open that product again from inside its
-// own open, without end.
-std::set<std::string> &ImagesBeingOpened() {
-    static std::set<std::string> paths;
-    return paths;
+// Why an opened image cannot serve its band, or null when it can. The reads
+// hand every sample to the caller in an int32 word or a float: complex
+// products pack in-phase and quadrature as two 16-bit halves of one word, so
+// anything wider would be cut; detected samples must fit an int32 exactly.
+const char *LayoutMisfit(FILE *image, bool complex) {
+    const int32_t type = VXBChanType(image, 1);
+    if (complex) {
+        if (VXBChanCount(image) < 2)
+            return "a complex product's image needs in-phase and quadrature "
+                   "samples";
+        if (type != kChanInt16)
+            return "a complex product's samples must be 16-bit integers";
+        return nullptr;
+    }
+    if (type == kChanUInt8 || type == kChanUInt16 || type == kChanInt16 ||
+        type == kChanInt32)
+        return nullptr;
+    return "a detected product's samples must be integers of at most 32 "
+           "signed bits";
 }
 
-class OpeningImage {
-  public:
-    explicit OpeningImage(const std::string &pathIn) : path(pathIn) {
-        inserted = ImagesBeingOpened().insert(path).second;
-    }
-    ~OpeningImage() {
-        if (inserted)
-            ImagesBeingOpened().erase(path);
-    }
-    OpeningImage(const OpeningImage &) = delete;
-    OpeningImage &operator=(const OpeningImage &) = delete;
-    // False when the same path is already being opened further up.
-    bool Inserted() const { return inserted; }
+// Warns why a band's image is not opened and keeps the reason for the
+// reads, which report it when the band is asked for.
+FILE *RefuseBand(BandRecord &band, const std::string &reason) {
+    IMPError(kWarningCode, host::kWarning, "%s", reason.c_str());
+    band.failure = reason;
+    return nullptr;
+}
 
-  private:
-    std::string path;
-    bool inserted = false;
-};
-
-// The image file of channel 1, which gives the dataset its size; null when
-// that channel has no image.
-FILE *FirstChannelImage(ZirOdi2CalibImage &model) {
-    model.EnsureChannels();
-    ChannelRecord *first = model.FindChannel(1);
-    if (first == nullptr || first->band == nullptr)
-        return nullptr;
-    return model.OpenBand(*first->band);
+// The image of the lowest-numbered channel that has one: channel 1's image
+// gives the dataset its size, and when it cannot be opened the next one
+// does, so that the channels with images stay readable.
+FILE *SizingImage(ZirOdi2CalibImage &model) {
+    const int32_t count = model.ChannelCount();
+    for (int32_t number = 1; number <= count; ++number) {
+        ChannelRecord *channel = model.FindChannel(number);
+        if (channel == nullptr || channel->band == nullptr)
+            continue;
+        if (FILE *image = model.OpenBand(*channel->band))
+            return image;
+    }
+    return nullptr;
 }
 
 } // namespace
@@ -193,31 +200,41 @@ BandRecord *ZirOdi2CalibImage::FindBand(int32_t polarization) const {
 FILE *ZirOdi2CalibImage::OpenBand(BandRecord &band) {
     if (band.imageHandle != nullptr || band.openFailed)
         return band.imageHandle;
+    // A handle that could not be had is never retried, so the warning about
+    // the file is not repeated on every request; the mark is set first so
+    // that an open that throws is not retried either.
+    band.openFailed = true;
     // A band without a file name has no image; the product directory alone
     // names no image file.
-    if (band.fileName == nullptr || *band.fileName == '\0') {
-        band.openFailed = true;
+    if (band.fileName == nullptr || *band.fileName == '\0')
+        return nullptr;
+    const ProductFile file =
+        ResolveProductFile(productDirectory, band.fileName);
+    if (file.place != ProductFilePlace::Inside)
+        return RefuseBand(band, UnreadableProductFileText(file));
+    // Only the host's own image reader may serve a band: any other file,
+    // another product's description among them, would be opened as a whole
+    // dataset of its own, with sample layouts the reads do not expect.
+    if (!host::HasTiffSignature(file.path))
+        return RefuseBand(band,
+                          "cannot open " + file.path + ": not a TIFF image");
+    const std::size_t warningCount = host::Warnings().size();
+    FILE *image = VXBOpen(file.path.c_str(), "r");
+    if (image == nullptr) {
+        const std::vector<std::string> warnings = host::Warnings();
+        band.failure = warnings.size() > warningCount
+                           ? warnings.back()
+                           : "cannot open " + file.path;
         return nullptr;
     }
-    // MkName buffers are recycled, and opening may format many texts.
-    std::string path =
-        MkName("%s%s", productDirectory != nullptr ? productDirectory : "",
-               band.fileName);
-    // A handle the host could not give is never passed on: the band then
-    // behaves as one without an image, and the host's warning about the file
-    // is not repeated on every request. The mark is set first so that an
-    // open that throws is not retried either.
-    band.openFailed = true;
-    OpeningImage opening(path);
-    if (!opening.Inserted()) {
-        IMPError(kWarningCode, host::kWarning,
-                 _("Image file %s leads back to a product being opened."),
-                 path.c_str());
-        return nullptr;
+    const bool complex = productType == static_cast<int32_t>(ProductType::SLC);
+    if (const char *misfit = LayoutMisfit(image, complex)) {
+        VXBClose(image);
+        return RefuseBand(band, "cannot read " + file.path + ": " + misfit);
     }
-    band.imageHandle = VXBOpen(path.c_str(), "r");
-    band.openFailed = band.imageHandle == nullptr;
-    return band.imageHandle;
+    band.imageHandle = image;
+    band.openFailed = false;
+    return image;
 }
 
 ChannelRecord *ZirOdi2CalibImage::NewChannel(int32_t polarization,
@@ -267,12 +284,12 @@ ChannelRecord *ZirOdi2CalibImage::FindChannel(int32_t number) const {
 }
 
 int32_t ZirOdi2CalibImage::Width() {
-    FILE *image = FirstChannelImage(*this);
+    FILE *image = SizingImage(*this);
     return image != nullptr ? VXBChanXSize(image) : 0;
 }
 
 int32_t ZirOdi2CalibImage::Height() {
-    FILE *image = FirstChannelImage(*this);
+    FILE *image = SizingImage(*this);
     return image != nullptr ? VXBChanYSize(image) : 0;
 }
 

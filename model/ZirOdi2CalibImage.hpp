@@ -10,6 +10,7 @@
 #include <cstdio>
 #include <map>
 #include <memory>
+#include <string>
 
 /// The image file of one polarization.
 struct BandRecord {
@@ -17,6 +18,7 @@ struct BandRecord {
     char *fileName = nullptr;    // host string, relative to productDirectory
     FILE *imageHandle = nullptr; // opened on first use, closed with the model
     bool openFailed = false;     // the file could not be opened; not retried
+    std::string failure;         // why not: the warning reported then
 };
 
 /// One channel the dataset presents.

@@ -18,6 +18,7 @@
 #include <map>
 #include <memory>
 #include <new>
+#include <string>
 #include <strings.h>
 #include <vector>
 
@@ -54,6 +55,13 @@ std::size_t ElementCount(int64_t count1, int64_t count2, int64_t count3 = 1) {
 
 // The report of a read that could not get its scratch memory.
 constexpr int32_t kErrOutOfMemory = 12;
+// The report of a request the dataset cannot serve as asked.
+constexpr int32_t kErrCannotServe = 5;
+
+const char *ProductName(const ZirOdi2CalibImage &model) {
+    const char *product = model.GetProductDirectory();
+    return product != nullptr ? product : "";
+}
 
 // Scratch memory of the host allocator. Memory that cannot be had (count 0
 // stands for a size too large to address) throws std::bad_alloc, which the
@@ -74,9 +82,8 @@ void ReportingOutOfMemory(const ZirOdi2CalibImage &model, Read read) {
     try {
         read();
     } catch (const std::bad_alloc &) {
-        const char *product = model.GetProductDirectory();
         IMPError(kErrOutOfMemory, host::kError, "out of memory reading %s",
-                 product != nullptr ? product : "");
+                 ProductName(model));
     }
 }
 
@@ -87,20 +94,52 @@ bool IsCalibrated(const char *calibrationType) {
            strcasecmp(calibrationType, "None") != 0;
 }
 
-bool ValidRequest(int32_t xSize, int32_t ySize, int32_t bufferXSize,
-                  int32_t bufferYSize, int32_t channelCount,
-                  const int32_t *channelList) {
-    return xSize > 0 && ySize > 0 && bufferXSize > 0 && bufferYSize > 0 &&
-           channelCount > 0 && channelList != nullptr;
+// A request with nothing to read is refused rather than answered with an
+// untouched buffer.
+void RequireRequest(const ZirOdi2CalibImage &model, int32_t xSize,
+                    int32_t ySize, int32_t bufferXSize, int32_t bufferYSize,
+                    int32_t channelCount, const int32_t *channelList) {
+    if (xSize <= 0 || ySize <= 0 || bufferXSize <= 0 || bufferYSize <= 0 ||
+        channelCount <= 0 || channelList == nullptr)
+        IMPError(kErrCannotServe, host::kError,
+                 "%s: window %dx%d to %dx%d with %d channels is empty",
+                 ProductName(model), xSize, ySize, bufferXSize, bufferYSize,
+                 channelCount);
 }
 
-// The image file of a channel, or null when the channel does not exist, has
-// no image file, or its file cannot be opened (VXBOpen has warned then).
-FILE *ChannelImage(ZirOdi2CalibImage &model, int32_t channel) {
-    ChannelRecord *record = model.FindChannel(channel);
-    if (record == nullptr || record->band == nullptr)
-        return nullptr;
-    return model.OpenBand(*record->band);
+// Why a channel has no image, as its band remembers it.
+std::string ImageFailure(const BandRecord *band) {
+    if (band == nullptr || band->fileName == nullptr || *band->fileName == '\0')
+        return "product.xml names no image file for it";
+    if (!band->failure.empty())
+        return band->failure;
+    return std::string("cannot open ") + band->fileName;
+}
+
+// The image file of every listed channel, in list order. A read either
+// writes every sample it was asked for or reports why it cannot: a channel
+// that does not exist or whose image cannot be opened (VXBOpen or the band
+// has warned why) ends the request before anything is written.
+std::vector<FILE *> RequireChannelImages(ZirOdi2CalibImage &model,
+                                         int32_t channelCount,
+                                         const int32_t *channelList) {
+    std::vector<FILE *> images;
+    images.reserve(static_cast<std::size_t>(channelCount));
+    for (int32_t c = 0; c < channelCount; ++c) {
+        ChannelRecord *record = model.FindChannel(channelList[c]);
+        if (record == nullptr) {
+            IMPError(kErrCannotServe, host::kError, "%s has no channel %d",
+                     ProductName(model), channelList[c]);
+            return {};
+        }
+        FILE *image =
+            record->band != nullptr ? model.OpenBand(*record->band) : nullptr;
+        if (image == nullptr)
+            IMPError(kErrCannotServe, host::kError, "channel %d: %s",
+                     channelList[c], ImageFailure(record->band).c_str());
+        images.push_back(image);
+    }
+    return images;
 }
 
 // Two 16-bit halves of a complex sample as one word, in-phase low.
@@ -151,27 +190,22 @@ void ReadDetectedPlanes(ZirOdi2CalibImage &model, int32_t mode, int32_t xOffset,
                         PlaneSet &planes, int32_t bufferXSize,
                         int32_t bufferYSize, int32_t channelCount,
                         const int32_t *channelList) {
+    const std::vector<FILE *> images =
+        RequireChannelImages(model, channelCount, channelList);
     const std::size_t pixels = ElementCount(bufferXSize, bufferYSize);
     const bool calibrated = IsCalibrated(model.GetCalibrationType());
     for (int32_t c = 0; c < channelCount; ++c) {
         const int32_t channel = channelList[c];
-        ChannelRecord *record = model.FindChannel(channel);
-        if (record == nullptr || planes.count(channel) != 0)
+        if (planes.count(channel) != 0)
             continue;
         HostArray<float> plane = AllocateHost<float>(pixels);
-        FILE *image = ChannelImage(model, channel);
-        if (image == nullptr) {
-            // Nothing is read for a channel without an image file; its
-            // samples are zero rather than whatever the heap held.
-            std::fill_n(plane.get(), pixels, 0.0f);
-        } else {
-            VXBReal32ChanIO(image, mode, xOffset, yOffset, xSize, ySize,
-                            plane.get(), bufferXSize, bufferYSize, 1,
-                            &record->bandChannel);
-            if (calibrated)
-                CalibrateDetectedPlane(model, xOffset, yOffset, xSize,
-                                       bufferXSize, bufferYSize, plane.get());
-        }
+        VXBReal32ChanIO(images[static_cast<std::size_t>(c)], mode, xOffset,
+                        yOffset, xSize, ySize, plane.get(), bufferXSize,
+                        bufferYSize, 1,
+                        &model.FindChannel(channel)->bandChannel);
+        if (calibrated)
+            CalibrateDetectedPlane(model, xOffset, yOffset, xSize, bufferXSize,
+                                   bufferYSize, plane.get());
         planes.emplace(channel, std::move(plane));
     }
 }
@@ -202,12 +236,9 @@ void InterleavePlanes(float *buffer, const PlaneSet &planes,
     }
     for (std::size_t c = 0; c < stride; ++c) {
         float *out = buffer + c;
-        if (const float *plane = sources[c])
-            for (std::size_t p = 0; p < pixels; ++p)
-                out[p * stride] = plane[p];
-        else
-            for (std::size_t p = 0; p < pixels; ++p)
-                out[p * stride] = 0.0f;
+        const float *plane = sources[c];
+        for (std::size_t p = 0; p < pixels; ++p)
+            out[p * stride] = plane[p];
     }
 }
 
@@ -287,8 +318,6 @@ void ReadComplexReal(ZirOdi2CalibImage &model, int32_t mode, int32_t xOffset,
                      float *buffer, int32_t bufferXSize, int32_t bufferYSize,
                      int32_t channelCount, const int32_t *channelList) {
     const std::size_t rowElements = ElementCount(xSize, 2);
-    if (rowElements == 0)
-        return;
     const std::size_t rowBytes = rowElements * sizeof(int32_t);
     const auto sliceRows = static_cast<int32_t>(std::min<std::size_t>(
         std::max<std::size_t>(1, kComplexSliceBytes / rowBytes),
@@ -297,13 +326,12 @@ void ReadComplexReal(ZirOdi2CalibImage &model, int32_t mode, int32_t xOffset,
         ElementCount(static_cast<int64_t>(rowElements), sliceRows));
     const ColumnMap columns = MapComplexColumns(model.CalibrationTable(),
                                                 xOffset, xSize, bufferXSize);
+    const std::vector<FILE *> images =
+        RequireChannelImages(model, channelCount, channelList);
     for (int32_t c = 0; c < channelCount; ++c) {
-        FILE *image = ChannelImage(model, channelList[c]);
-        if (image == nullptr)
-            continue;
-        ReadComplexChannel(image, mode, xOffset, yOffset, xSize, ySize, buffer,
-                           bufferYSize, columns, channelCount, c, slice.get(),
-                           sliceRows);
+        ReadComplexChannel(images[static_cast<std::size_t>(c)], mode, xOffset,
+                           yOffset, xSize, ySize, buffer, bufferYSize, columns,
+                           channelCount, c, slice.get(), sliceRows);
     }
 }
 
@@ -317,17 +345,16 @@ void ReadIntegerSamples(ZirOdi2CalibImage &model, int32_t mode, int32_t xOffset,
     const bool complex =
         model.GetProductType() == static_cast<int32_t>(ProductType::SLC);
     const int32_t samplesPerPixel = complex ? 2 : 1;
+    const std::vector<FILE *> images =
+        RequireChannelImages(model, channelCount, channelList);
     const std::size_t pixels = ElementCount(bufferXSize, bufferYSize);
     HostArray<int32_t> scratch = AllocateHost<int32_t>(
         ElementCount(bufferXSize, bufferYSize, samplesPerPixel));
     const auto stride = static_cast<std::size_t>(channelCount);
     for (int32_t c = 0; c < channelCount; ++c) {
-        FILE *image = ChannelImage(model, channelList[c]);
-        if (image == nullptr)
-            continue;
-        VXBInt32ChanIO(image, mode, xOffset, yOffset, xSize, ySize,
-                       scratch.get(), bufferXSize, bufferYSize, samplesPerPixel,
-                       kComplexChannels);
+        VXBInt32ChanIO(images[static_cast<std::size_t>(c)], mode, xOffset,
+                       yOffset, xSize, ySize, scratch.get(), bufferXSize,
+                       bufferYSize, samplesPerPixel, kComplexChannels);
         const int32_t *in = scratch.get();
         int32_t *out = buffer + c;
         for (std::size_t p = 0; p < pixels; ++p)
@@ -347,10 +374,12 @@ void ZirOdi2CalibImage::ReadIntegerChannels(
     EnsureChannels();
     // Calibrated products announce real channels, which the real read serves.
     if (IsCalibrated(GetCalibrationType()))
-        return;
-    if (!ValidRequest(xSize, ySize, bufferXSize, bufferYSize, channelCount,
-                      channelList))
-        return;
+        IMPError(kErrCannotServe, host::kError,
+                 "%s is calibrated to %s: its channels are real values, read "
+                 "with the real read",
+                 ProductName(*this), GetCalibrationType());
+    RequireRequest(*this, xSize, ySize, bufferXSize, bufferYSize, channelCount,
+                   channelList);
     ReportingOutOfMemory(*this, [&] {
         ReadIntegerSamples(*this, mode, xOffset, yOffset, xSize, ySize, buffer,
                            bufferXSize, bufferYSize, channelCount, channelList);
@@ -364,9 +393,8 @@ void ZirOdi2CalibImage::ReadRealChannels(
     if (buffer == nullptr)
         return;
     EnsureChannels();
-    if (!ValidRequest(xSize, ySize, bufferXSize, bufferYSize, channelCount,
-                      channelList))
-        return;
+    RequireRequest(*this, xSize, ySize, bufferXSize, bufferYSize, channelCount,
+                   channelList);
     ReportingOutOfMemory(*this, [&] {
         if (GetProductType() == static_cast<int32_t>(ProductType::SLC)) {
             ReadComplexReal(*this, mode, xOffset, yOffset, xSize, ySize, buffer,

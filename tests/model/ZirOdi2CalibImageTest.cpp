@@ -8,14 +8,17 @@
 #include "tests/support/CommandRun.hpp"
 #include "tests/support/TempDir.hpp"
 #include "tests/support/TestFiles.hpp"
+#include "tests/support/TiffWriter.hpp"
 #include "tools/generator/ProductGenerator.hpp"
 
 #include <gtest/gtest.h>
 
 #include <algorithm>
 #include <cstdlib>
+#include <filesystem>
 #include <memory>
 #include <string>
+#include <sys/stat.h>
 #include <vector>
 
 namespace {
@@ -189,14 +192,6 @@ TEST_F(ImageFiles, treats_an_unopenable_file_as_a_band_without_image) {
     EXPECT_EQ(model.Width(), options.width);
 }
 
-TEST_F(ImageFiles, keeps_names_relative_without_a_product_directory) {
-    RUZ2GrpcCR model;
-    // No directory stored: the file name alone is the path.
-    model.AddBand(kHH, product.imageFiles[0].c_str());
-    EXPECT_EQ(model.GetProductDirectory(), nullptr);
-    EXPECT_EQ(model.Width(), options.width);
-}
-
 TEST_F(ImageFiles, opens_nothing_for_a_band_without_a_file_name) {
     RUZ2GrpcCR model;
     model.SetProductDirectory(product.productXml.c_str());
@@ -207,25 +202,62 @@ TEST_F(ImageFiles, opens_nothing_for_a_band_without_a_file_name) {
     EXPECT_TRUE(host::Warnings().empty());
 }
 
-TEST_F(ImageFiles, refuses_an_image_file_that_leads_back_to_its_product) {
-    // The image file named is the product description itself, which the
-    // host hands to the driver: without a guard, opening the image would
-    // open the product, whose image opens the product again, without end.
-    if (std::getenv("VXB_DRIVER_PATH") == nullptr)
-        setenv("VXB_DRIVER_PATH", RS2_DRIVER_MODULE, 1);
-    std::string text = rs2test::FileText(product.productXml);
-    const std::string image = ">" + rs2gen::ImageFileName("HH") + "<";
-    ASSERT_NE(text.find(image), std::string::npos);
-    text.replace(text.find(image), image.size(), ">product.xml<");
-    rs2test::WriteFile(product.productXml, text);
-    RUZ2GrpcCR model;
-    model.SetProductDirectory(product.productXml.c_str());
-    model.AddBand(kHH, "product.xml");
-    EXPECT_EQ(model.Width(), 0);
-    const std::vector<std::string> warnings = host::Warnings();
-    EXPECT_TRUE(std::any_of(warnings.begin(), warnings.end(), [](auto &w) {
-        return w.find("leads back to a product being opened") != w.npos;
-    }));
+TEST_F(ImageFiles, serves_only_image_files_of_the_product_it_can_hold) {
+    namespace fs = std::filesystem;
+    const fs::path folder = fs::path(product.productXml).parent_path();
+    const std::string image = rs2gen::ImageFileName("HH");
+    rs2test::TempDir elsewhere;
+    fs::copy_file(folder / image, elsewhere.File("other.tif"));
+    fs::create_symlink(elsewhere.File("other.tif"), folder / "out.tif");
+    fs::create_symlink(folder / image, folder / "in.tif");
+    fs::create_directory(folder / "folder.tif");
+    ASSERT_EQ(::mkfifo((folder / "pipe.tif").c_str(), 0600), 0);
+    rs2test::TiffShape wide;
+    wide.width = 4;
+    wide.height = 3;
+    wide.bitsPerSample = 64;
+    wide.sampleFormat = SAMPLEFORMAT_COMPLEXINT;
+    rs2test::WriteTiff((folder / "cint32.tif").string(), wide,
+                       [](uint32_t, uint32_t, uint32_t) { return 70000.0; });
+    rs2test::TiffShape real;
+    real.width = 4;
+    real.height = 3;
+    real.bitsPerSample = 32;
+    real.sampleFormat = SAMPLEFORMAT_IEEEFP;
+    rs2test::WriteTiff((folder / "float.tif").string(), real,
+                       [](uint32_t, uint32_t, uint32_t) { return 0.5; });
+    struct Case {
+        std::string name;
+        ProductType type;
+        const char *warning; // null when the image opens
+    } cases[] = {
+        {"in.tif", ProductType::SGF, nullptr},
+        {"product.xml", ProductType::SGF, "not a TIFF image"},
+        {"out.tif", ProductType::SGF, "leads out of the product folder"},
+        {"folder.tif", ProductType::SGF, "not a regular file"},
+        {"pipe.tif", ProductType::SGF, "not a regular file"},
+        {"%2e%2e/" + image + "?c=sigma", ProductType::SGF, "no such file"},
+        {"cint32.tif", ProductType::SLC, "must be 16-bit integers"},
+        {"float.tif", ProductType::SGF, "must be integers"},
+        {image, ProductType::SLC, "needs in-phase and quadrature"},
+    };
+    for (const Case &c : cases) {
+        SCOPED_TRACE(c.name);
+        host::ClearWarnings();
+        RUZ2GrpcCR model;
+        model.SetProductType(static_cast<int32_t>(c.type));
+        model.SetProductDirectory(product.productXml.c_str());
+        model.AddBand(kHH, c.name.c_str());
+        EXPECT_EQ(model.Width(), c.warning ? 0 : options.width);
+        const std::vector<std::string> warnings = host::Warnings();
+        if (c.warning == nullptr) {
+            EXPECT_TRUE(warnings.empty());
+            continue;
+        }
+        ASSERT_EQ(warnings.size(), 1u);
+        EXPECT_NE(warnings[0].find(c.warning), std::string::npos)
+            << warnings[0];
+    }
 }
 
 } // namespace

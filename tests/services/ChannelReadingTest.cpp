@@ -79,7 +79,7 @@ TEST(ChannelReading, detected_real_reads_give_each_listed_channel_its_image) {
         const char *calibration; // the table kind; null: uncalibrated
         Window window;
         std::vector<int32_t> channels;
-        std::vector<int> images; // per channel; -1: reads 0
+        std::vector<int> images; // generator image index per channel
     };
     rs2gen::ProductOptions withOffset = Options("SGF", {"HH"}, 160, 20);
     withOffset.lutOffset = 2.5f;
@@ -90,13 +90,12 @@ TEST(ChannelReading, detected_real_reads_give_each_listed_channel_its_image) {
         // Columns 100 on: the gain of the image column, not the window's.
         {"calibrated: gain and offset of the image column", withOffset,
          "Sigma Nought", {100, 3, 40, 8, 40, 8}, {1}, {0}},
-        // Channel 2 twice, a channel the dataset does not define, channel 1.
+        // Channel 2 twice, then channel 1.
         {"channels in list order", Options("SGF", {"HH", "HV"}, 24, 16),
-         nullptr, {3, 2, 8, 6, 8, 6}, {2, 9, 1, 2}, {1, -1, 0, 1}},
-        // HH and VH only: the layout pairs VV (no image) with VH. The host
-        // halves the window, and each column keeps its own gain.
-        {"a channel without an image file", Options("SGF", {"HH", "VH"}, 24, 16),
-         "Sigma Nought", {0, 0, 24, 16, 12, 8}, {1, 2}, {-1, 1}},
+         nullptr, {3, 2, 8, 6, 8, 6}, {2, 1, 2}, {1, 0, 1}},
+        // The host halves the window, and each column keeps its own gain.
+        {"resampled", Options("SGF", {"HH", "HV"}, 24, 16),
+         "Sigma Nought", {0, 0, 24, 16, 12, 8}, {2}, {1}},
     };
     // clang-format on
     for (const Case &c : cases) {
@@ -119,12 +118,10 @@ TEST(ChannelReading, detected_real_reads_give_each_listed_channel_its_image) {
             for (int x = 0; x < w.bufferWidth; ++x)
                 for (int image : c.images) {
                     const int column = w.Column(x);
-                    const float dn =
-                        image < 0 ? 0.0f
-                                  : float(rs2gen::DetectedSample(
-                                        c.options, image, column, w.Line(y)));
+                    const float dn = float(rs2gen::DetectedSample(
+                        c.options, image, column, w.Line(y)));
                     const float expected =
-                        c.calibration && image >= 0
+                        c.calibration
                             ? (dn * dn + offset) / gains.at(size_t(column))
                             : dn;
                     mismatches += std::fabs(buffer[i++] - expected) >
@@ -140,52 +137,67 @@ TEST(ChannelReading, integer_read_of_detected_product_lets_host_resample) {
     ASSERT_NE(loaded.model, nullptr);
     // Half the window in each direction: image column 4 + 2k, line 2 + 2j.
     const Window w{4, 2, 30, 20, 15, 10};
-    const auto buffer = ReadInteger(*loaded.model, w, {1, 4});
+    const auto buffer = ReadInteger(*loaded.model, w, {1});
     for (int y = 0; y < w.bufferHeight; ++y) {
         for (int x = 0; x < w.bufferWidth; ++x) {
             const size_t p = static_cast<size_t>(y) * w.bufferWidth + x;
-            ASSERT_EQ(buffer[2 * p], rs2gen::DetectedSample(
-                                         options, 0, w.x + 2 * x, w.y + 2 * y));
-            // Channel 4 does not exist: its samples stay as they were.
-            ASSERT_EQ(buffer[2 * p + 1], kUntouchedWord);
+            ASSERT_EQ(buffer[p], rs2gen::DetectedSample(options, 0, w.x + 2 * x,
+                                                        w.y + 2 * y));
         }
     }
 }
 
-TEST(ChannelReading,
-     integer_read_of_calibrated_product_leaves_buffer_as_it_was) {
-    LoadedProduct loaded(Options("SGF", {"HH"}, 16, 12), "beta");
-    ASSERT_NE(loaded.model, nullptr);
-    ASSERT_STREQ(loaded.model->GetCalibrationType(), "Beta Nought");
-    EXPECT_EQ(ReadInteger(*loaded.model, {0, 0, 16, 12, 16, 12}, {1}),
-              std::vector<int32_t>(16 * 12, kUntouchedWord));
-}
-
-TEST(ChannelReading, requests_without_output_write_nothing) {
-    LoadedProduct loaded(Options("SGF", {"HH"}, 16, 12), nullptr);
-    ASSERT_NE(loaded.model, nullptr);
+// A read either fills the whole buffer or reports why it cannot, and then
+// leaves the buffer as it was.
+TEST(ChannelReading, requests_it_cannot_serve_are_errors_that_write_nothing) {
     struct Case {
         const char *what;
-        int32_t bufferWidth, bufferHeight, channelCount;
+        const char *type;
+        std::vector<std::string> polarizations;
+        const char *calibration;
+        bool integer;
+        int32_t bufferWidth, bufferHeight;
+        std::vector<int32_t> channels;
+        const char *message;
     };
+    // clang-format off
     const Case cases[] = {
-        {"no channels", 4, 4, 0},
-        {"negative channel count", 4, 4, -1},
-        {"empty buffer width", 0, 4, 1},
-        {"negative buffer height", 4, -2, 1},
+        {"integer read of calibrated values", "SGF", {"HH"}, "beta", true, 4, 4, {1}, "calibrated to Beta Nought"},
+        {"no channels", "SGF", {"HH"}, nullptr, false, 4, 4, {}, "is empty"},
+        {"empty buffer", "SGF", {"HH"}, nullptr, true, 0, 4, {1}, "is empty"},
+        {"undefined channel, detected", "SGF", {"HH"}, "sigma", false, 4, 4, {1, 4}, "has no channel 4"},
+        {"undefined channel, integer", "SGF", {"HH"}, nullptr, true, 4, 4, {4}, "has no channel 4"},
+        {"undefined channel, complex", "SLC", {"HH"}, "sigma", false, 4, 4, {1, 3}, "has no channel 3"},
+        // HH and VH only: the layout pairs VV (no image) with VH.
+        {"channel without image, detected", "SGF", {"HH", "VH"}, nullptr, false, 4, 4, {2, 1}, "channel 1: product.xml names no image"},
+        {"channel without image, integer", "SGF", {"HH", "VH"}, nullptr, true, 4, 4, {1}, "no image file for it"},
     };
-    const int32_t channels[] = {1};
+    // clang-format on
     for (const Case &c : cases) {
-        std::vector<float> real(16, kUntouched);
-        std::vector<int32_t> words(16, kUntouchedWord);
-        loaded.model->ReadRealChannels(0, 0, 0, 4, 4, real.data(),
-                                       c.bufferWidth, c.bufferHeight,
-                                       c.channelCount, channels);
-        loaded.model->ReadIntegerChannels(0, 0, 0, 4, 4, words.data(),
-                                          c.bufferWidth, c.bufferHeight,
-                                          c.channelCount, channels);
-        EXPECT_EQ(real, std::vector<float>(16, kUntouched)) << c.what;
-        EXPECT_EQ(words, std::vector<int32_t>(16, kUntouchedWord)) << c.what;
+        SCOPED_TRACE(c.what);
+        LoadedProduct loaded(Options(c.type, c.polarizations, 16, 12),
+                             c.calibration);
+        ASSERT_NE(loaded.model, nullptr);
+        std::vector<float> real(32, kUntouched);
+        std::vector<int32_t> words(32, kUntouchedWord);
+        const auto count = static_cast<int32_t>(c.channels.size());
+        try {
+            if (c.integer)
+                loaded.model->ReadIntegerChannels(0, 0, 0, 4, 4, words.data(),
+                                                  c.bufferWidth, c.bufferHeight,
+                                                  count, c.channels.data());
+            else
+                loaded.model->ReadRealChannels(0, 0, 0, 4, 4, real.data(),
+                                               c.bufferWidth, c.bufferHeight,
+                                               count, c.channels.data());
+            ADD_FAILURE() << "no error reported";
+        } catch (const host::ReportedError &error) {
+            EXPECT_NE(std::string(error.what()).find(c.message),
+                      std::string::npos)
+                << error.what();
+        }
+        EXPECT_EQ(real, std::vector<float>(32, kUntouched));
+        EXPECT_EQ(words, std::vector<int32_t>(32, kUntouchedWord));
     }
 }
 
@@ -268,7 +280,6 @@ TEST(ChannelReading, complex_reads_give_pairs_divided_by_the_column_gain) {
         // 5 x 3 pixels spread over 12 x 7: the last output column and line
         // hold the window's last ones, never the image pixels beyond it.
         {"larger than the window", 40, 30, "gamma", "Gamma", {10, 5, 5, 3, 12, 7}, {1}},
-        {"an undefined channel first", 16, 8, "sigma", "Sigma Nought", {1, 1, 8, 4, 8, 4}, {3, 1}},
     };
     // clang-format on
     for (const Case &c : cases) {
