@@ -1,6 +1,7 @@
 #include "fuzz/FuzzDrivers.hpp"
 
 #include "driver/DatasetNames.hpp"
+#include "fuzz/FolderArchive.hpp"
 #include "fuzz/FuzzWorkspace.hpp"
 #include "host/ErrorReports.hpp"
 #include "host/Exception.hpp"
@@ -272,10 +273,27 @@ Outcome TextSegment(const uint8_t *data, size_t size) {
     });
 }
 
+// The input is a whole product folder (see FolderArchive.hpp): its name,
+// its description, side file, tables, images and links all come from the
+// fuzzer. The product is opened calibrated, described and read.
+Outcome ProductFolder(const uint8_t *data, size_t size) {
+    host::ClearWarnings();
+    const Workspace &workspace = Workspace::Of("product_folder");
+    static const std::string root = [&] {
+        const std::string path = workspace.File("in");
+        std::filesystem::create_directory(path);
+        return path;
+    }();
+    const std::string folder = UnpackProductFolder(root, data, size);
+    return Both(LoadAndRead(folder + "/product.xml", "sigma"),
+                OpenAndDescribe(folder + "/product.xml?c=sigma"));
+}
+
 const Target kTargets[] = {
-    {"product_xml", ProductXml}, {"lut", LookupTableFile},
-    {"side_file", SideFile},     {"dataset_name", DatasetName},
-    {"tiff_window", TiffWindow}, {"text_segment", TextSegment},
+    {"product_xml", ProductXml},       {"lut", LookupTableFile},
+    {"side_file", SideFile},           {"dataset_name", DatasetName},
+    {"tiff_window", TiffWindow},       {"text_segment", TextSegment},
+    {"product_folder", ProductFolder},
 };
 
 } // namespace
