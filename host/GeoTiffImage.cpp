@@ -320,6 +320,12 @@ int32_t GeoTiffImage::ChannelCount() const {
 
 int32_t GeoTiffImage::ChannelType() const { return state->layout.channelType; }
 
+StoredSamples GeoTiffImage::Samples() const {
+    const TiffLayout &layout = state->layout;
+    return {layout.sampleFormat, layout.bitsPerSample,
+            static_cast<int32_t>(layout.samplesPerPixel)};
+}
+
 void GeoTiffImage::ReadInt32(const WindowRequest &window,
                              const std::vector<int32_t> &channels,
                              int32_t *dst) {

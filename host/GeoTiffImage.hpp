@@ -23,6 +23,13 @@ struct TiePoint {
         z; // model position (longitude, latitude, height for geographic files)
 };
 
+/// How a file stores its samples, as it declares them.
+struct StoredSamples {
+    int32_t sampleFormat;    // TIFF SampleFormat (a void format reads as 1)
+    int32_t bitsPerSample;   // a complex sample counts both halves
+    int32_t samplesPerPixel; // a complex sample counts once
+};
+
 /// A GeoTIFF file opened for reading by the built-in reader. It owns its
 /// TIFF handle; libtiff's messages go to a per-image handler and are kept as
 /// the reason of the next failure, never printed.
@@ -42,6 +49,7 @@ class GeoTiffImage {
     int32_t ChannelCount() const;
     /// ChannelTypeCode of the channels (all channels share one type).
     int32_t ChannelType() const;
+    StoredSamples Samples() const;
 
     /// Reads a window resampled by nearest neighbour into dst,
     /// pixel-interleaved over channels (1-based). Throws host::ReportedError

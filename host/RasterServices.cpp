@@ -263,6 +263,21 @@ int32_t VXBChanType(FILE *fp, int32_t channel) {
     return handle.image->ChannelType();
 }
 
+bool VXBSampleLayout(FILE *fp, int32_t *sampleFormat, int32_t *bitsPerSample,
+                     int32_t *samplesPerPixel) {
+    const RasterHandle *handle = host::LookupHandle(fp);
+    const bool known = handle != nullptr && handle->image != nullptr;
+    const host::StoredSamples layout =
+        known ? handle->image->Samples() : host::StoredSamples{0, 0, 0};
+    if (sampleFormat)
+        *sampleFormat = layout.sampleFormat;
+    if (bitsPerSample)
+        *bitsPerSample = layout.bitsPerSample;
+    if (samplesPerPixel)
+        *samplesPerPixel = layout.samplesPerPixel;
+    return known;
+}
+
 void VXBInt32ChanIO(FILE *fp, int32_t mode, int32_t xoff, int32_t yoff,
                     int32_t xsize, int32_t ysize, int32_t *dst, int32_t dstx,
                     int32_t dsty, int32_t nchan, const int32_t *chanlist) {

@@ -110,3 +110,14 @@ void VXBSatEphemerisFree(EphemerisSeg_t *record);
 /// lineTimeOrdering / pixelTimeOrdering reads "Decreasing".
 bool GetSARFlippingParameters(char *const *list, bool *lineFlip,
                               bool *pixelFlip);
+
+/// How an image of the built-in GeoTIFF reader stores its samples, as its
+/// file declares them, so that a caller can check an image before reading
+/// it: TIFF SampleFormat (1 unsigned integer, 2 signed integer, 3 IEEE float,
+/// 5 complex integer; a void format reads as 1), BitsPerSample (a complex
+/// sample counts both halves: 32 for complex int16, 64 for complex int32) and
+/// SamplesPerPixel (a complex sample counts once; VXBChanCount counts its two
+/// halves). Returns false with zeros for a driver dataset or an unknown
+/// handle. Null outputs are skipped.
+bool VXBSampleLayout(FILE *fp, int32_t *sampleFormat, int32_t *bitsPerSample,
+                     int32_t *samplesPerPixel);

@@ -55,6 +55,8 @@ void ReadSampleFormat(const TiffFile &file, TiffLayout &layout) {
             layout.elementBytes = entry.elementBytes;
             layout.elementsPerSample = entry.elementsPerSample;
             layout.channelType = entry.channelType;
+            layout.sampleFormat = format;
+            layout.bitsPerSample = bits;
             return;
         }
     }

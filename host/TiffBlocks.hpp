@@ -24,6 +24,10 @@ struct TiffLayout {
     uint32_t elementsPerSample = 1; // 2 for complex integers
     uint32_t samplesPerPixel = 1;
     int32_t channelType = 0; // ChannelTypeCode of every channel
+    // As the file declares them (a void sample format reads as unsigned):
+    // complex samples count both halves in bitsPerSample.
+    uint16_t sampleFormat = SAMPLEFORMAT_UINT;
+    uint16_t bitsPerSample = 8;
     bool separatePlanes = false;
     bool tiled = false;
     bool compressed = false;

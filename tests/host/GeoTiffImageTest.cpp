@@ -194,6 +194,29 @@ TEST(GeoTiffImage, windows_match_the_written_samples_in_every_layout) {
     }
 }
 
+// The driver checks an image's sample layout before reading it, so the
+// facts must tell apart layouts that share a channel type (int8 and int16,
+// complex int16 and two int16 samples) and complex int16 from complex int32.
+TEST(GeoTiffImage, sample_layout_is_told_as_the_file_declares_it) {
+    TempDir dir;
+    const std::string path = dir.File("image.tif");
+    for (const FormatCase &format : kFormats) {
+        SCOPED_TRACE(format.name);
+        rs2test::WriteTiff(path, SpecFor(format, kLayouts[0]), format.Values());
+        FILE *fp = VXBOpen(path.c_str(), "r");
+        ASSERT_NE(fp, nullptr);
+        int32_t sampleFormat = 0, bits = 0, samples = 0;
+        EXPECT_TRUE(VXBSampleLayout(fp, &sampleFormat, &bits, &samples));
+        VXBClose(fp);
+        EXPECT_EQ(sampleFormat, format.sampleFormat);
+        EXPECT_EQ(bits, format.bitsPerSample);
+        EXPECT_EQ(samples, 2);
+    }
+    int32_t sampleFormat = -1;
+    EXPECT_FALSE(VXBSampleLayout(nullptr, &sampleFormat, nullptr, nullptr));
+    EXPECT_EQ(sampleFormat, 0);
+}
+
 void Corrupt(const std::string &path, const std::vector<uint32_t> &blocks) {
     const auto stored = rs2test::StoredBlocks(path);
     std::fstream file(path, std::ios::in | std::ios::out | std::ios::binary);
