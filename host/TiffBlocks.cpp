@@ -245,8 +245,6 @@ void TiffBlockCache::Decode(uint32_t plane, uint32_t blockRow,
                      : TIFFReadEncodedStrip(tif, index, into, expected);
     if (decoded != expected)
         file.Fail("cannot decode " + BlockName(layout, index));
-    // The decoded copy is kept here; its stored bytes are not needed again.
-    file.ReleaseBlock(index);
 }
 
 void TiffBlockCache::CheckStoredInFile(

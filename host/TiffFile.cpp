@@ -4,14 +4,12 @@
 
 #include <xtiffio.h>
 
-#include <algorithm>
 #include <cerrno>
 #include <cstdarg>
 #include <cstdint>
 #include <cstdio>
 #include <fcntl.h>
 #include <mutex>
-#include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -69,18 +67,16 @@ void InstallTagDefinitions() {
     });
 }
 
-// libtiff reads through these procedures; the mapping is made here so that
-// its pages can be released behind the read.
-using Mapping = TiffFile::Mapping;
-
-Mapping &MappingOf(thandle_t client) { return *static_cast<Mapping *>(client); }
+// libtiff reads through these procedures; the client data is the file's
+// descriptor.
+int DescriptorOf(thandle_t client) { return *static_cast<int *>(client); }
 
 tmsize_t ReadProc(thandle_t client, void *buffer, tmsize_t size) {
     tmsize_t done = 0;
     while (done < size) {
-        ssize_t got = read(MappingOf(client).descriptor,
-                           static_cast<char *>(buffer) + done,
-                           static_cast<size_t>(size - done));
+        ssize_t got =
+            read(DescriptorOf(client), static_cast<char *>(buffer) + done,
+                 static_cast<size_t>(size - done));
         if (got < 0 && errno == EINTR)
             continue;
         if (got <= 0)
@@ -94,7 +90,7 @@ tmsize_t WriteProc(thandle_t, void *, tmsize_t) { return -1; }
 
 toff_t SeekProc(thandle_t client, toff_t offset, int whence) {
     off_t moved =
-        lseek(MappingOf(client).descriptor, static_cast<off_t>(offset), whence);
+        lseek(DescriptorOf(client), static_cast<off_t>(offset), whence);
     return moved < 0 ? static_cast<toff_t>(-1) : static_cast<toff_t>(moved);
 }
 
@@ -102,31 +98,14 @@ int CloseProc(thandle_t) { return 0; } // the descriptor is closed by ~TiffFile
 
 toff_t SizeProc(thandle_t client) {
     struct stat info {};
-    if (fstat(MappingOf(client).descriptor, &info) != 0)
+    if (fstat(DescriptorOf(client), &info) != 0)
         return 0;
     return static_cast<toff_t>(info.st_size);
 }
 
-int MapProc(thandle_t client, void **base, toff_t *size) {
-    Mapping &mapping = MappingOf(client);
-    toff_t bytes = SizeProc(client);
-    if (bytes == 0 || bytes > static_cast<toff_t>(SIZE_MAX))
-        return 0;
-    void *mapped = mmap(nullptr, static_cast<size_t>(bytes), PROT_READ,
-                        MAP_SHARED, mapping.descriptor, 0);
-    if (mapped == MAP_FAILED)
-        return 0;
-    mapping.base = mapped;
-    mapping.size = bytes;
-    *base = mapped;
-    *size = bytes;
-    return 1;
-}
+int NoMapProc(thandle_t, void **, toff_t *) { return 0; }
 
-void UnmapProc(thandle_t client, void *base, toff_t size) {
-    munmap(base, static_cast<size_t>(size));
-    MappingOf(client).base = nullptr;
-}
+void NoUnmapProc(thandle_t, void *, toff_t) {}
 
 } // namespace
 
@@ -154,15 +133,15 @@ TiffFile::TiffFile(const std::string &pathIn)
     TIFFOpenOptionsSetErrorHandlerExtR(options.get(), KeepError,
                                        lastError.get());
     TIFFOpenOptionsSetWarningHandlerExtR(options.get(), DropWarning, nullptr);
-    mapping = std::make_unique<Mapping>();
-    mapping->descriptor = OpenRegularFile(path);
-    if (mapping->descriptor < 0)
+    descriptor = std::make_unique<int>(OpenRegularFile(path));
+    if (*descriptor < 0)
         Fail(errno == EINVAL ? "not a regular file" : "cannot open the file");
-    tiff.reset(TIFFClientOpenExt(path.c_str(), "r", mapping.get(), ReadProc,
+    // "m": never map the file (see the class comment).
+    tiff.reset(TIFFClientOpenExt(path.c_str(), "rm", descriptor.get(), ReadProc,
                                  WriteProc, SeekProc, CloseProc, SizeProc,
-                                 MapProc, UnmapProc, options.get()));
+                                 NoMapProc, NoUnmapProc, options.get()));
     if (!tiff) {
-        close(mapping->descriptor);
+        close(*descriptor);
         Fail("not a readable TIFF file");
     }
     lastError->clear();
@@ -170,33 +149,13 @@ TiffFile::TiffFile(const std::string &pathIn)
 
 TiffFile::~TiffFile() {
     tiff.reset();
-    if (mapping)
-        close(mapping->descriptor);
-}
-
-void TiffFile::ReleaseBlock(uint32_t index) const {
-    if (mapping->base == nullptr)
-        return;
-    int failed = 0;
-    uint64_t offset = TIFFGetStrileOffsetWithErr(tiff.get(), index, &failed);
-    if (failed || offset >= mapping->size)
-        return;
-    // Pages are released in large steps well behind the block just read:
-    // one system call per step, and none of the pages the kernel maps in
-    // around the next faults comes back.
-    constexpr uint64_t kReleaseStep = 4 << 20;
-    if (offset < mapping->releasedUpTo + 2 * kReleaseStep)
-        return;
-    const uint64_t page = static_cast<uint64_t>(sysconf(_SC_PAGESIZE));
-    uint64_t upTo = (offset - kReleaseStep) / page * page;
-    madvise(static_cast<char *>(mapping->base) + mapping->releasedUpTo,
-            upTo - mapping->releasedUpTo, MADV_DONTNEED);
-    mapping->releasedUpTo = upTo;
+    if (descriptor && *descriptor >= 0)
+        close(*descriptor);
 }
 
 uint64_t TiffFile::FileSize() const {
     struct stat info {};
-    if (fstat(mapping->descriptor, &info) != 0)
+    if (fstat(*descriptor, &info) != 0)
         Fail("cannot read the file size");
     return static_cast<uint64_t>(info.st_size);
 }

@@ -2,6 +2,7 @@
 #include "host/ErrorReports.hpp"
 #include "host/ModelSegments.hpp"
 #include "host/RasterServices.hpp"
+#include "host/TiffFile.hpp"
 #include "tests/support/CommandRun.hpp"
 #include "tests/support/TempDir.hpp"
 #include "tests/support/TestFiles.hpp"
@@ -393,6 +394,27 @@ TEST(GeoTiffImage, truncated_file_fails_to_open_or_to_read) {
         return;
     }
     ExpectReadFailsWritingNothing(*image, {0, 0, 37, 29, 37, 29}, {1, 2});
+}
+
+// A file shrunk by another process while it is open must give a read error,
+// never a signal: libtiff itself decodes a block of it after the cut, and so
+// does the reader.
+TEST(GeoTiffImage, file_truncated_while_open_gives_a_read_error) {
+    TempDir dir;
+    const std::string path = dir.File("shrinking.tif");
+    TiffShape spec;
+    spec.width = 1024;
+    spec.height = 1024;
+    spec.tileSize = 512;
+    rs2test::WriteTiff(path, spec, kUInt16.Values());
+    const host::TiffFile file(path);
+    std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
+    std::filesystem::resize_file(path, std::filesystem::file_size(path) / 4);
+    std::vector<unsigned char> tile(512 * 512 * 2);
+    EXPECT_EQ(TIFFReadEncodedTile(file.Handle(), 3, tile.data(),
+                                  tmsize_t(tile.size())),
+              -1);
+    ExpectReadFailsWritingNothing(*image, {512, 512, 512, 512, 1, 1}, {1});
 }
 
 std::string LittleEndian32(uint64_t value) {
