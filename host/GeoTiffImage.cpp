@@ -22,10 +22,11 @@
 // checked before the first byte is written. So does a decoding failure:
 // the blocks are checked to lie inside the file before anything is
 // allocated or written (compressed ones also to store enough bytes for their
-// declared size), and compressed ones (whose data can turn out corrupt
-// midway) are converted into a scratch copy of the output that reaches dst
-// only once every block decoded. Only a file changed on disk during the read
-// can still leave dst partly written.
+// declared size), the memory for them is taken from the process's budget for
+// decoded blocks before the first one is decoded, and compressed ones (whose
+// data can turn out corrupt midway) are converted into a scratch copy of the
+// output that reaches dst only once every block decoded. Only a file changed on
+// disk during the read can still leave dst partly written.
 //
 // Conversions: to float, every value as the nearest float; to int32, integers
 // as they are (uint32 values above INT32_MAX clamp to it), floats rounded to
@@ -279,6 +280,7 @@ void GeoTiffImage::State::Read(const WindowRequest &window,
         const WindowPlan plan = MakePlan(layout, window, channels);
         cache.CheckStoredInFile(NeededBlockRows(layout, plan),
                                 plan.neededPlanes, plan.neededColumns);
+        cache.Reserve(plan.neededPlanes);
         if (!layout.compressed) {
             CopyWindowOfType(cache, layout, window, plan, dst);
             return;

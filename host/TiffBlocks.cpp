@@ -1,17 +1,15 @@
 #include "host/TiffBlocks.hpp"
 
+#include "host/ErrorReports.hpp"
 #include "host/RasterServices.hpp"
 
 #include <algorithm>
+#include <cstring>
 #include <limits>
 #include <string>
 
 namespace host {
 namespace {
-
-// A file can declare strips or tiles of any size; a row of blocks larger
-// than this is refused instead of allocated.
-constexpr uint64_t kMaxBlockRowBytes = uint64_t(1) << 30;
 
 // How far compressed data can expand: PackBits 64 times, LZW and Deflate
 // about 1400 and 1030 times, runs of one byte in zstd some 30,000 times. A
@@ -128,12 +126,15 @@ bool BoundedProduct(std::initializer_list<uint64_t> factors, uint64_t limit,
 // What the reader assumes about the blocks must be what libtiff decodes:
 // the block count, and the size of a tile or of a row of a strip.
 void CheckBlockGrid(const TiffFile &file, const TiffLayout &layout) {
+    // A file can declare strips or tiles of any size; a row of blocks that
+    // could never fit the memory budget is refused when the file is opened.
     uint64_t rowOfBlocks = 0;
     if (!BoundedProduct(
             {layout.blocksAcross, layout.BlockBytes(), layout.PlaneCount()},
-            kMaxBlockRowBytes, rowOfBlocks))
-        file.Fail("a row of strips or tiles would exceed " +
-                  std::to_string(kMaxBlockRowBytes) + " bytes");
+            BlockMemoryBudget(), rowOfBlocks))
+        file.Fail("a row of strips or tiles would exceed the " +
+                  std::to_string(BlockMemoryBudget()) +
+                  "-byte memory budget for decoded blocks");
     TIFF *tif = file.Handle();
     const uint64_t blockCount =
         uint64_t(layout.blocksAcross) * layout.blocksDown * layout.PlaneCount();
@@ -213,26 +214,71 @@ TiffBlockCache::TiffBlockCache(const TiffFile &fileIn,
                                const TiffLayout &layoutIn)
     : file(fileIn), layout(layoutIn), entries(layoutIn.PlaneCount()) {}
 
+void TiffBlockCache::Reserve(const std::vector<bool> &neededPlanes) {
+    for (uint32_t plane = 0; plane < layout.PlaneCount(); ++plane)
+        if (neededPlanes[plane])
+            ReserveEntry(entries[plane]);
+}
+
+void TiffBlockCache::ReserveEntry(Entry &entry) {
+    if (entry.bytes.Data() != nullptr)
+        return;
+    const uint64_t rowBytes = layout.blocksAcross * layout.BlockBytes();
+    if (!entry.bytes.Allocate(rowBytes))
+        throw ReportedError(
+            kErrUnreadableFile, kError,
+            file.Path() + ": decoding a row of its strips or tiles needs " +
+                std::to_string(rowBytes) + " bytes, more than the " +
+                std::to_string(BlockMemoryBudget() - BlockMemoryInUse()) +
+                " left of the " + std::to_string(BlockMemoryBudget()) +
+                "-byte memory budget for decoded blocks of all open images");
+    entry.held.assign(layout.blocksAcross, StoredBlock{});
+}
+
 const unsigned char *
 TiffBlockCache::Load(uint32_t plane, uint32_t blockRow,
                      const std::vector<bool> &neededColumns) {
     Entry &entry = entries[plane];
-    if (entry.bytes.empty()) {
-        entry.bytes.resize(layout.blocksAcross * layout.BlockBytes());
-        entry.decoded.resize(layout.blocksAcross);
+    ReserveEntry(entry);
+    for (uint32_t column = 0; column < layout.blocksAcross; ++column)
+        if (neededColumns[column])
+            Fill(entry, plane, blockRow, column);
+    return entry.bytes.Data();
+}
+
+TiffBlockCache::StoredBlock TiffBlockCache::Stored(uint32_t plane,
+                                                   uint32_t blockRow,
+                                                   uint32_t blockColumn) const {
+    const uint32_t index = layout.BlockIndex(plane, blockRow, blockColumn);
+    int failed = 0;
+    StoredBlock block;
+    block.offset = TIFFGetStrileOffsetWithErr(file.Handle(), index, &failed);
+    block.byteCount =
+        TIFFGetStrileByteCountWithErr(file.Handle(), index, &failed);
+    block.decodedBytes = failed ? 0 : layout.DecodedBytes(blockRow);
+    return block;
+}
+
+// Puts the decoded block (blockRow, blockColumn) into its slot of the row,
+// decoding it only when no slot holds the same stored block already.
+void TiffBlockCache::Fill(Entry &entry, uint32_t plane, uint32_t blockRow,
+                          uint32_t blockColumn) {
+    const StoredBlock wanted = Stored(plane, blockRow, blockColumn);
+    StoredBlock &held = entry.held[blockColumn];
+    if (wanted.decodedBytes != 0 && held == wanted)
+        return;
+    unsigned char *slot =
+        entry.bytes.Data() + blockColumn * layout.BlockBytes();
+    held = StoredBlock{}; // until the slot holds a whole block again
+    const auto same = std::find(entry.held.begin(), entry.held.end(), wanted);
+    if (wanted.decodedBytes != 0 && same != entry.held.end()) {
+        const auto column = static_cast<size_t>(same - entry.held.begin());
+        std::memcpy(slot, entry.bytes.Data() + column * layout.BlockBytes(),
+                    wanted.decodedBytes);
+    } else {
+        Decode(plane, blockRow, blockColumn, slot);
     }
-    if (entry.blockRow != blockRow) {
-        std::fill(entry.decoded.begin(), entry.decoded.end(), false);
-        entry.blockRow = blockRow;
-    }
-    for (uint32_t column = 0; column < layout.blocksAcross; ++column) {
-        if (neededColumns[column] && !entry.decoded[column]) {
-            Decode(plane, blockRow, column,
-                   entry.bytes.data() + column * layout.BlockBytes());
-            entry.decoded[column] = true;
-        }
-    }
-    return entry.bytes.data();
+    held = wanted;
 }
 
 void TiffBlockCache::Decode(uint32_t plane, uint32_t blockRow,

@@ -1,5 +1,6 @@
 #pragma once
 
+#include "host/BlockMemoryBudget.hpp"
 #include "host/TiffFile.hpp"
 
 #include <cstddef>
@@ -58,19 +59,31 @@ struct TiffLayout {
 /// the file when the layout is one the reader does not decode: sample formats
 /// other than 8/16/32-bit integers, 32-bit floats and 16/32-bit complex
 /// integers (BitsPerSample 32/64), YCbCr subsampling, a codec libtiff lacks,
-/// or blocks whose decoded row would exceed the reader's memory bound.
+/// or blocks whose decoded row alone would exceed the process's memory
+/// budget for decoded blocks (see BlockMemoryBudget.hpp).
 TiffLayout ReadTiffLayout(const TiffFile &file);
 
 /// Decodes rows of blocks and keeps the last one of every plane, so that
 /// consecutive lines of the same strips or tiles are decoded once. Memory:
-/// one row of blocks per plane, i.e. one row of blocks of the image.
+/// one row of blocks per plane, i.e. one row of blocks of the image, charged
+/// to the process's budget for decoded blocks until the cache is destroyed.
+/// Blocks are known by where they are stored: a block stored where one the
+/// cache holds was stored (same offset, byte count and decoded size) is not
+/// decoded again, so a file whose blocks all share one stream costs one
+/// decoding, not one per block.
 class TiffBlockCache {
   public:
     TiffBlockCache(const TiffFile &fileIn, const TiffLayout &layoutIn);
 
+    /// Allocates the rows of blocks of the flagged planes. Throws
+    /// host::ReportedError naming the file when the budget for decoded blocks
+    /// cannot hold them, std::bad_alloc when the system cannot.
+    void Reserve(const std::vector<bool> &neededPlanes);
+
     /// The decoded row of blocks blockRow of plane, with at least the blocks
     /// flagged in neededColumns decoded; valid until the next call. Throws
-    /// host::ReportedError when libtiff cannot decode a block.
+    /// host::ReportedError when libtiff cannot decode a block, or when the
+    /// plane's row of blocks cannot be allocated (see Reserve).
     const unsigned char *Load(uint32_t plane, uint32_t blockRow,
                               const std::vector<bool> &neededColumns);
 
@@ -83,11 +96,25 @@ class TiffBlockCache {
                            const std::vector<bool> &neededColumns) const;
 
   private:
-    struct Entry {
-        int64_t blockRow = -1; // -1: nothing decoded yet
-        std::vector<unsigned char> bytes;
-        std::vector<bool> decoded; // per block column
+    // Where a block's data is stored, and how much of it is decoded.
+    struct StoredBlock {
+        uint64_t offset = 0;
+        uint64_t byteCount = 0;
+        uint64_t decodedBytes = 0; // 0: the slot holds no decoded block
+        bool operator==(const StoredBlock &other) const {
+            return offset == other.offset && byteCount == other.byteCount &&
+                   decodedBytes == other.decodedBytes;
+        }
     };
+    struct Entry {
+        BudgetedBytes bytes;           // one row of blocks
+        std::vector<StoredBlock> held; // per block column
+    };
+    void ReserveEntry(Entry &entry);
+    StoredBlock Stored(uint32_t plane, uint32_t blockRow,
+                       uint32_t blockColumn) const;
+    void Fill(Entry &entry, uint32_t plane, uint32_t blockRow,
+              uint32_t blockColumn);
     void Decode(uint32_t plane, uint32_t blockRow, uint32_t blockColumn,
                 unsigned char *into) const;
     void CheckBlockStored(uint32_t plane, uint32_t blockRow,

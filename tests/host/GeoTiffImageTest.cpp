@@ -1,4 +1,5 @@
 #include "host/GeoTiffImage.hpp"
+#include "host/BlockMemoryBudget.hpp"
 #include "host/ErrorReports.hpp"
 #include "host/ModelSegments.hpp"
 #include "host/RasterServices.hpp"
@@ -470,10 +471,10 @@ void WriteDeflateStrip(const std::string &path, uint32_t width, uint32_t height,
 
 TEST(GeoTiffImage, compressed_strip_too_small_for_its_size_is_refused) {
     TempDir dir;
-    // 40 bytes that would have to expand to 800 MB: refused before anything
+    // 40 bytes that would have to expand to 240 MB: refused before anything
     // is allocated for the strip.
     const std::string claimed = dir.File("claimed.tif");
-    WriteDeflateStrip(claimed, 800, 1000000, std::string(40, 'x'));
+    WriteDeflateStrip(claimed, 800, 300000, std::string(40, 'x'));
     std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(claimed);
     try {
         std::vector<float> values(800);
@@ -499,6 +500,91 @@ TEST(GeoTiffImage, compressed_strip_too_small_for_its_size_is_refused) {
     ASSERT_LT(std::filesystem::file_size(zeros), 2000u * 2000u / 500u);
     ExpectWindow(*GeoTiffImage::Open(zeros), zero, ExpectedInt,
                  {0, 1990, 2000, 10, 2000, 10}, {1});
+}
+
+// Sets the process's budget for decoded blocks for the life of a test.
+class BudgetForTest {
+  public:
+    explicit BudgetForTest(uint64_t bytes) {
+        host::SetBlockMemoryBudget(bytes);
+    }
+    ~BudgetForTest() {
+        host::SetBlockMemoryBudget(host::kDefaultBlockMemoryBudget);
+    }
+};
+
+TEST(GeoTiffImage, decoded_blocks_of_all_open_images_share_one_budget) {
+    TempDir dir;
+    TiffShape shape; // one Deflate strip of 614400 bytes
+    shape.width = 600;
+    shape.height = 512;
+    shape.rowsPerStrip = 512;
+    shape.compression = COMPRESSION_ADOBE_DEFLATE;
+    const std::string first = dir.File("first.tif");
+    const std::string second = dir.File("second.tif");
+    rs2test::WriteTiff(first, shape, kUInt16.Values());
+    rs2test::WriteTiff(second, shape, kUInt16.Values());
+    const BudgetForTest budget(1 << 20);
+    std::unique_ptr<GeoTiffImage> firstImage = GeoTiffImage::Open(first);
+    std::unique_ptr<GeoTiffImage> secondImage = GeoTiffImage::Open(second);
+    const WindowRequest pixel = {599, 511, 1, 1, 1, 1};
+    ExpectWindow(*firstImage, kUInt16.Values(), ExpectedInt, pixel, {1});
+    EXPECT_EQ(host::BlockMemoryInUse(), 614400u);
+    ExpectReadFailsWritingNothing(*secondImage, pixel, {1});
+    ExpectErrorNaming(second, [&] {
+        float value = 0;
+        secondImage->ReadReal32(pixel, {1}, &value);
+    });
+    firstImage.reset(); // gives its row of blocks back
+    EXPECT_EQ(host::BlockMemoryInUse(), 0u);
+    ExpectWindow(*secondImage, kUInt16.Values(), ExpectedInt, pixel, {1});
+    // A row of blocks the budget could never hold is refused at once.
+    host::SetBlockMemoryBudget(600000);
+    ExpectErrorNaming(first, [&] { GeoTiffImage::Open(first); });
+}
+
+// Rewrites the file's block offsets so that every block is the first one's
+// data; the blocks must have been written with equal contents.
+void PointEveryBlockAtTheFirst(const std::string &path) {
+    const auto stored = rs2test::StoredBlocks(path);
+    std::string offsets, first;
+    for (const auto &[offset, count] : stored) {
+        ASSERT_EQ(count, stored[0].second);
+        offsets += LittleEndian32(offset);
+        first += LittleEndian32(stored[0].first);
+    }
+    std::string bytes = rs2test::FileText(path);
+    const size_t at = bytes.find(offsets);
+    ASSERT_NE(at, std::string::npos);
+    bytes.replace(at, offsets.size(), first);
+    rs2test::WriteFile(path, bytes);
+}
+
+TEST(GeoTiffImage, blocks_sharing_one_stream_are_decoded_once) {
+    const rs2test::ElementValue periodic = [](uint32_t x, uint32_t y,
+                                              uint32_t e) {
+        return double((x % 16) * 31 + (y % 4) * 5 + e * 3);
+    };
+    TempDir dir;
+    for (const uint32_t tileSize : {0u, 16u}) {
+        SCOPED_TRACE(tileSize != 0 ? "tiles" : "strips");
+        const LayoutCase layout = {"shared", kContig,  kDeflate, PREDICTOR_NONE,
+                                   4,        tileSize, false};
+        TiffShape shape = SpecFor(kUInt16, layout);
+        shape.width = 64;
+        shape.height = 32;
+        const std::string path = dir.File("shared.tif");
+        rs2test::WriteTiff(path, shape, periodic);
+        PointEveryBlockAtTheFirst(path);
+        std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
+        ExpectWindow(*image, periodic, ExpectedInt, {0, 0, 64, 1, 64, 1},
+                     {1, 2});
+        // The shared stream turns to garbage: the blocks of the last row are
+        // the ones already decoded, so they are not decoded again.
+        Corrupt(path, {0});
+        ExpectWindow(*image, periodic, ExpectedInt, {0, 31, 64, 1, 64, 1},
+                     {1, 2});
+    }
 }
 
 // GeoKeyDirectory entries (key, value) of the georeferencing cases.
