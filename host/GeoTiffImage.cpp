@@ -62,14 +62,8 @@ size_t OutputElements(const std::string &path, const WindowRequest &window,
     return elements;
 }
 
-template <typename Out>
-void CheckRequest(const std::string &path, const TiffLayout &layout,
-                  const WindowRequest &window,
-                  const std::vector<int32_t> &channels, const Out *dst) {
-    if (dst == nullptr)
-        RefuseRequest(path, "no output buffer");
-    if (channels.empty())
-        RefuseRequest(path, "no channels requested");
+void CheckWindow(const std::string &path, const TiffLayout &layout,
+                 const WindowRequest &window) {
     if (window.xsize <= 0 || window.ysize <= 0 || window.dstx <= 0 ||
         window.dsty <= 0)
         RefuseRequest(path, "window " + WindowText(window) + " is empty");
@@ -80,6 +74,17 @@ void CheckRequest(const std::string &path, const TiffLayout &layout,
                                 " is outside the " +
                                 std::to_string(layout.width) + "x" +
                                 std::to_string(layout.height) + " image");
+}
+
+template <typename Out>
+void CheckRequest(const std::string &path, const TiffLayout &layout,
+                  const WindowRequest &window,
+                  const std::vector<int32_t> &channels, const Out *dst) {
+    if (dst == nullptr)
+        RefuseRequest(path, "no output buffer");
+    if (channels.empty())
+        RefuseRequest(path, "no channels requested");
+    CheckWindow(path, layout, window);
     for (int32_t channel : channels)
         if (channel < 1 || channel > layout.ChannelCount())
             RefuseRequest(path, "channel " + std::to_string(channel) +
@@ -326,6 +331,10 @@ StoredSamples GeoTiffImage::Samples() const {
     const TiffLayout &layout = state->layout;
     return {layout.sampleFormat, layout.bitsPerSample,
             static_cast<int32_t>(layout.samplesPerPixel)};
+}
+
+void GeoTiffImage::CheckWindow(const WindowRequest &window) const {
+    host::CheckWindow(state->file.Path(), state->layout, window);
 }
 
 void GeoTiffImage::ReadInt32(const WindowRequest &window,

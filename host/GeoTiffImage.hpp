@@ -51,6 +51,10 @@ class GeoTiffImage {
     int32_t ChannelType() const;
     StoredSamples Samples() const;
 
+    /// Throws host::ReportedError when window is empty or reaches outside
+    /// the image: the check of a read that comes before anything is
+    /// allocated for it.
+    void CheckWindow(const WindowRequest &window) const;
     /// Reads a window resampled by nearest neighbour into dst,
     /// pixel-interleaved over channels (1-based). Throws host::ReportedError
     /// for a bad window, size or channel, and for a decoding failure; nothing

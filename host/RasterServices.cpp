@@ -284,9 +284,10 @@ void VXBInt32ChanIO(FILE *fp, int32_t mode, int32_t xoff, int32_t yoff,
     RasterHandle &handle = RequireHandle(fp);
     RequireReadMode(mode, handle);
     if (handle.image) {
-        handle.image->ReadInt32(
-            MakeWindow(xoff, yoff, xsize, ysize, dstx, dsty),
-            ChannelVector(nchan, chanlist), dst);
+        const host::WindowRequest window =
+            MakeWindow(xoff, yoff, xsize, ysize, dstx, dsty);
+        handle.image->CheckWindow(window); // before the channel list is copied
+        handle.image->ReadInt32(window, ChannelVector(nchan, chanlist), dst);
         return;
     }
     CheckDatasetWindow(handle, xoff, yoff, xsize, ysize, dst, dstx, dsty, nchan,
@@ -303,9 +304,10 @@ void VXBReal32ChanIO(FILE *fp, int32_t mode, int32_t xoff, int32_t yoff,
     RasterHandle &handle = RequireHandle(fp);
     RequireReadMode(mode, handle);
     if (handle.image) {
-        handle.image->ReadReal32(
-            MakeWindow(xoff, yoff, xsize, ysize, dstx, dsty),
-            ChannelVector(nchan, chanlist), dst);
+        const host::WindowRequest window =
+            MakeWindow(xoff, yoff, xsize, ysize, dstx, dsty);
+        handle.image->CheckWindow(window); // before the channel list is copied
+        handle.image->ReadReal32(window, ChannelVector(nchan, chanlist), dst);
         return;
     }
     CheckDatasetWindow(handle, xoff, yoff, xsize, ysize, dst, dstx, dsty, nchan,

@@ -338,6 +338,35 @@ TEST(GeoTiffImage, refuses_bad_requests_without_writing) {
                  ReportedError);
 }
 
+// The list of a request far outside the image is never read: it claims far
+// more channels than it holds, which copying it would reveal.
+TEST(GeoTiffImage, window_outside_is_refused_before_the_channel_list_is_read) {
+    TempDir dir;
+    const std::string path = dir.File("image.tif");
+    rs2test::WriteTiff(path, SpecFor(kUInt16, kLayouts[0]), kUInt16.Values());
+    FILE *fp = VXBOpen(path.c_str(), "r");
+    ASSERT_NE(fp, nullptr);
+    const int32_t big = std::numeric_limits<int32_t>::max();
+    const int32_t channel = 1;
+    const WindowRequest windows[] = {{big - 1, 0, 1, 1, 1, 1},
+                                     {0, big - 1, 1, 1, 1, 1},
+                                     {-big, -big, 1, 1, 1, 1}};
+    for (const WindowRequest &w : windows) {
+        std::vector<int32_t> ints = Sentinels<int32_t>(1);
+        std::vector<float> reals = Sentinels<float>(1);
+        EXPECT_THROW(VXBInt32ChanIO(fp, 0, w.xoff, w.yoff, w.xsize, w.ysize,
+                                    ints.data(), w.dstx, w.dsty, big, &channel),
+                     ReportedError);
+        EXPECT_THROW(VXBReal32ChanIO(fp, 0, w.xoff, w.yoff, w.xsize, w.ysize,
+                                     reals.data(), w.dstx, w.dsty, big,
+                                     &channel),
+                     ReportedError);
+        EXPECT_EQ(ints, Sentinels<int32_t>(1));
+        EXPECT_EQ(reals, Sentinels<float>(1));
+    }
+    VXBClose(fp);
+}
+
 TEST(GeoTiffImage, refuses_files_it_cannot_decode) {
     struct Case {
         const char *what;
