@@ -31,6 +31,12 @@ uint64_t BlockMemoryBudget() { return budget; }
 
 uint64_t BlockMemoryInUse() { return inUse; }
 
+uint64_t BlockMemoryLeft() {
+    const uint64_t held = inUse;
+    const uint64_t limit = budget;
+    return held < limit ? limit - held : 0;
+}
+
 BudgetedBytes::~BudgetedBytes() { Free(); }
 
 bool BudgetedBytes::Allocate(uint64_t newSize) {

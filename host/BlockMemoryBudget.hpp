@@ -20,6 +20,8 @@ void SetBlockMemoryBudget(uint64_t bytes);
 uint64_t BlockMemoryBudget();
 /// Bytes held by all decoded-block buffers right now.
 uint64_t BlockMemoryInUse();
+/// Bytes the budget can still give (0 when it was lowered below what is held).
+uint64_t BlockMemoryLeft();
 
 /// A buffer for decoded blocks. Its bytes are charged to the budget before
 /// they are allocated and given back when the buffer is freed; they start

@@ -229,8 +229,8 @@ void TiffBlockCache::ReserveEntry(Entry &entry) {
             kErrUnreadableFile, kError,
             file.Path() + ": decoding a row of its strips or tiles needs " +
                 std::to_string(rowBytes) + " bytes, more than the " +
-                std::to_string(BlockMemoryBudget() - BlockMemoryInUse()) +
-                " left of the " + std::to_string(BlockMemoryBudget()) +
+                std::to_string(BlockMemoryLeft()) + " left of the " +
+                std::to_string(BlockMemoryBudget()) +
                 "-byte memory budget for decoded blocks of all open images");
     entry.held.assign(layout.blocksAcross, StoredBlock{});
 }
