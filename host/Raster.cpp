@@ -150,6 +150,25 @@ void RequireRoom(size_t needed, size_t count) {
                                         std::to_string(count));
 }
 
+// A window that reaches outside the raster is refused before a buffer is
+// allocated for its output, whose size is then anything the caller asked.
+void RequireInside(const Raster &raster, const Window &window) {
+    if (window.width <= 0 || window.height <= 0)
+        return; // the host reports an empty window itself
+    const int32_t width = raster.Width();
+    const int32_t height = raster.Height();
+    if (window.x < 0 || window.y < 0 ||
+        int64_t(window.x) + window.width > width ||
+        int64_t(window.y) + window.height > height)
+        throw Error(kErrBadRequest,
+                    raster.Name() + ": window " + std::to_string(window.x) +
+                        "," + std::to_string(window.y) + " " +
+                        std::to_string(window.width) + "x" +
+                        std::to_string(window.height) + " is outside the " +
+                        std::to_string(width) + "x" + std::to_string(height) +
+                        " raster");
+}
+
 } // namespace
 
 Error::Error(int32_t codeIn, const std::string &message)
@@ -214,6 +233,7 @@ std::vector<int32_t>
 Raster::ReadInt32(const Window &window, int32_t bufferWidth,
                   int32_t bufferHeight,
                   const std::vector<int32_t> &channels) const {
+    RequireInside(*this, window);
     std::vector<int32_t> buffer(
         BufferSize<int32_t>(bufferWidth, bufferHeight, channels.size(), 1));
     ReadInt32Into(window, bufferWidth, bufferHeight, channels, buffer.data(),
@@ -225,6 +245,7 @@ std::vector<float>
 Raster::ReadReal32(const Window &window, int32_t bufferWidth,
                    int32_t bufferHeight,
                    const std::vector<int32_t> &channels) const {
+    RequireInside(*this, window);
     std::vector<float> buffer(
         RealValueCount(*this, bufferWidth, bufferHeight, channels));
     ReadReal32Into(window, bufferWidth, bufferHeight, channels, buffer.data(),

@@ -2,6 +2,7 @@
 #include "host/BlockMemoryBudget.hpp"
 #include "host/ErrorReports.hpp"
 #include "host/ModelSegments.hpp"
+#include "host/Raster.hpp"
 #include "host/RasterServices.hpp"
 #include "host/TiffFile.hpp"
 #include "tests/support/CommandRun.hpp"
@@ -340,7 +341,7 @@ TEST(GeoTiffImage, refuses_bad_requests_without_writing) {
 
 // The list of a request far outside the image is never read: it claims far
 // more channels than it holds, which copying it would reveal.
-TEST(GeoTiffImage, window_outside_is_refused_before_the_channel_list_is_read) {
+TEST(GeoTiffImage, window_outside_is_refused_before_anything_is_allocated) {
     TempDir dir;
     const std::string path = dir.File("image.tif");
     rs2test::WriteTiff(path, SpecFor(kUInt16, kLayouts[0]), kUInt16.Values());
@@ -365,6 +366,17 @@ TEST(GeoTiffImage, window_outside_is_refused_before_the_channel_list_is_read) {
         EXPECT_EQ(reals, Sentinels<float>(1));
     }
     VXBClose(fp);
+    // The application API allocates the output of a read; it must not for
+    // a window outside, whatever output size is asked for.
+    const host::Raster raster = host::OpenRaster(path);
+    for (const WindowRequest &w : windows) {
+        EXPECT_THROW(
+            raster.ReadInt32({w.xoff, w.yoff, w.xsize, w.ysize}, big, big, {1}),
+            host::Error);
+        EXPECT_THROW(raster.ReadReal32({w.xoff, w.yoff, w.xsize, w.ysize}, big,
+                                       big, {1}),
+                     host::Error);
+    }
 }
 
 TEST(GeoTiffImage, refuses_files_it_cannot_decode) {
