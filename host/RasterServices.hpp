@@ -111,6 +111,14 @@ void VXBSatEphemerisFree(EphemerisSeg_t *record);
 bool GetSARFlippingParameters(char *const *list, bool *lineFlip,
                               bool *pixelFlip);
 
+/// The sample formats VXBSampleLayout tells (the file's TIFF SampleFormat).
+enum StoredSampleFormat : int32_t {
+    kSamplesUnsigned = 1,
+    kSamplesSigned = 2,
+    kSamplesFloat = 3,
+    kSamplesComplexInteger = 5,
+};
+
 /// How an image of the built-in GeoTIFF reader stores its samples, as its
 /// file declares them, so that a caller can check an image before reading
 /// it: TIFF SampleFormat (1 unsigned integer, 2 signed integer, 3 IEEE float,

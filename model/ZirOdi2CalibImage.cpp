@@ -44,20 +44,23 @@ bool CopyTieArray(double *&target, const double *source, int32_t count) {
 // products pack in-phase and quadrature as two 16-bit halves of one word, so
 // anything wider would be cut; detected samples must fit an int32 exactly.
 const char *LayoutMisfit(FILE *image, bool complex) {
-    const int32_t type = VXBChanType(image, 1);
+    int32_t format = 0, bits = 0, samples = 0;
+    VXBSampleLayout(image, &format, &bits, &samples);
     if (complex) {
-        if (VXBChanCount(image) < 2)
-            return "a complex product's image needs in-phase and quadrature "
-                   "samples";
-        if (type != kChanInt16)
-            return "a complex product's samples must be 16-bit integers";
-        return nullptr;
+        const bool pairs = format == kSamplesComplexInteger && bits == 32;
+        const bool twoSamples =
+            format == kSamplesSigned && bits == 16 && samples >= 2;
+        return pairs || twoSamples
+                   ? nullptr
+                   : "a complex product's samples must be pairs of 16-bit "
+                     "integers";
     }
-    if (type == kChanUInt8 || type == kChanUInt16 || type == kChanInt16 ||
-        type == kChanInt32)
-        return nullptr;
-    return "a detected product's samples must be integers of at most 32 "
-           "signed bits";
+    const bool unsignedFits = format == kSamplesUnsigned && bits <= 16;
+    const bool signedFits = format == kSamplesSigned && bits <= 32;
+    return unsignedFits || signedFits
+               ? nullptr
+               : "a detected product's samples must be integers of at most "
+                 "32 signed bits";
 }
 
 // Warns why a band's image is not opened and keeps the reason for the

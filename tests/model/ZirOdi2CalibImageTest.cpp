@@ -237,9 +237,10 @@ TEST_F(ImageFiles, serves_only_image_files_of_the_product_it_can_hold) {
         {"folder.tif", ProductType::SGF, "not a regular file"},
         {"pipe.tif", ProductType::SGF, "not a regular file"},
         {"%2e%2e/" + image + "?c=sigma", ProductType::SGF, "no such file"},
-        {"cint32.tif", ProductType::SLC, "must be 16-bit integers"},
+        {"cint32.tif", ProductType::SLC, "pairs of 16-bit integers"},
+        {"cint32.tif", ProductType::SGF, "must be integers"},
         {"float.tif", ProductType::SGF, "must be integers"},
-        {image, ProductType::SLC, "needs in-phase and quadrature"},
+        {image, ProductType::SLC, "pairs of 16-bit integers"},
     };
     for (const Case &c : cases) {
         SCOPED_TRACE(c.name);
