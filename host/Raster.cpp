@@ -150,16 +150,13 @@ void RequireRoom(size_t needed, size_t count) {
                                         std::to_string(count));
 }
 
-// A window that reaches outside the raster is refused before a buffer is
-// allocated for its output, whose size is then anything the caller asked.
-void RequireInside(const Raster &raster, const Window &window) {
-    if (window.width <= 0 || window.height <= 0)
-        return; // the host reports an empty window itself
+// The buffer of a read is allocated before the host sees the request, so
+// a window outside the raster is refused here, before it costs memory.
+void RequireWindowWithin(const Raster &raster, const Window &window) {
     const int32_t width = raster.Width();
     const int32_t height = raster.Height();
-    if (window.x < 0 || window.y < 0 ||
-        int64_t(window.x) + window.width > width ||
-        int64_t(window.y) + window.height > height)
+    if (window.x < 0 || window.y < 0 || window.width < 1 || window.height < 1 ||
+        window.width > width - window.x || window.height > height - window.y)
         throw Error(kErrBadRequest,
                     raster.Name() + ": window " + std::to_string(window.x) +
                         "," + std::to_string(window.y) + " " +
@@ -233,7 +230,7 @@ std::vector<int32_t>
 Raster::ReadInt32(const Window &window, int32_t bufferWidth,
                   int32_t bufferHeight,
                   const std::vector<int32_t> &channels) const {
-    RequireInside(*this, window);
+    RequireWindowWithin(*this, window);
     std::vector<int32_t> buffer(
         BufferSize<int32_t>(bufferWidth, bufferHeight, channels.size(), 1));
     ReadInt32Into(window, bufferWidth, bufferHeight, channels, buffer.data(),
@@ -245,7 +242,7 @@ std::vector<float>
 Raster::ReadReal32(const Window &window, int32_t bufferWidth,
                    int32_t bufferHeight,
                    const std::vector<int32_t> &channels) const {
-    RequireInside(*this, window);
+    RequireWindowWithin(*this, window);
     std::vector<float> buffer(
         RealValueCount(*this, bufferWidth, bufferHeight, channels));
     ReadReal32Into(window, bufferWidth, bufferHeight, channels, buffer.data(),

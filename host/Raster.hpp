@@ -104,6 +104,7 @@ class VXB_API Raster {
 
     /// A window resampled to bufferWidth x bufferHeight, pixel-interleaved
     /// over channels (1-based); complex real data gives two floats per sample.
+    /// A window outside the raster throws Error before any allocation.
     std::vector<int32_t> ReadInt32(const Window &window, int32_t bufferWidth,
                                    int32_t bufferHeight,
                                    const std::vector<int32_t> &channels) const;
