@@ -3,13 +3,17 @@
 #include "tools/generator/ProductGenerator.hpp"
 
 #include <charconv>
+#include <filesystem>
 #include <iostream>
 #include <memory>
 #include <optional>
+#include <stdexcept>
 #include <string_view>
 #include <utility>
 
 namespace {
+
+namespace fs = std::filesystem;
 
 struct SampleArguments {
     std::string directory;
@@ -18,6 +22,7 @@ struct SampleArguments {
     bool noImages = false;
     bool noRpc = false;
     bool noTiePoints = false;
+    bool force = false;
     rs2gen::ProductOptions options;
 };
 
@@ -53,7 +58,27 @@ CLI::Validator SizeText() {
         "WxH");
 }
 
+// Writing a product into a folder that holds files replaces any of them
+// with the product's names, a product perhaps: only on request.
+void RequireEmptyFolder(const std::string &directory) {
+    std::error_code error;
+    const fs::file_status status = fs::status(directory, error);
+    if (status.type() == fs::file_type::not_found)
+        return;
+    if (error)
+        throw std::runtime_error("cannot write " + directory + ": " +
+                                 error.message());
+    if (status.type() != fs::file_type::directory)
+        throw std::runtime_error(directory + " exists and is not a folder");
+    if (!fs::is_empty(directory, error) || error)
+        throw std::runtime_error(
+            directory + " is not empty; give --force to write the product "
+                        "into it, replacing files of the same names");
+}
+
 void RunSample(SampleArguments arguments) {
+    if (!arguments.force)
+        RequireEmptyFolder(arguments.directory);
     rs2gen::ProductOptions &options = arguments.options;
     std::tie(options.width, options.height) = *ParseSize(arguments.size);
     options.lookupTables = !arguments.noLuts;
@@ -75,7 +100,9 @@ void AddSampleCommand(CLI::App &app) {
     CLI::App *sample = app.add_subcommand(
         "sample", "Write a synthetic product folder (product.xml, look-up "
                   "tables, GeoTIFFs) and print the path of its product.xml");
-    sample->footer("Examples:\n  rs2 sample /tmp/sgf --type SGF --pols HH,HV "
+    sample->footer("DIR is created when missing; a folder that is not "
+                   "empty is refused unless --force.\nExamples:\n  rs2 sample "
+                   "/tmp/sgf --type SGF --pols HH,HV "
                    "--size 800x600\n  rs2 sample /tmp/slc --type SLC --pols "
                    "HH,HV,VH,VV --seed 3");
     sample->add_option("DIR", arguments->directory, "Product folder to write")
@@ -103,6 +130,9 @@ void AddSampleCommand(CLI::App &app) {
         ->add_option("--lut-offset", options.lutOffset,
                      "Offset of the look-up tables")
         ->capture_default_str();
+    sample->add_flag("--force", arguments->force,
+                     "Write into a folder that is not empty, replacing files "
+                     "of the product's names (other files stay)");
     sample->add_flag("--no-luts", arguments->noLuts,
                      "Leave out the look-up table files");
     sample->add_flag("--no-images", arguments->noImages,
