@@ -38,8 +38,8 @@ std::vector<BrokenCase> ReadCatalogue(const std::string &path);
 CommandResult RunRs2(const std::string &arguments);
 
 /// Checks a run against an outcome: exit 1 with exactly one line on stderr,
-/// "rs2: " and the text; or exit 0, nothing on stderr and the text in the
-/// standard output.
+/// "rs2: " and the text; or exit 0, nothing on stderr but one line
+/// "rs2: warning: ...", and the text in the standard output.
 void ExpectOutcome(const CommandResult &run, const Outcome &expected);
 
 /// The options of the valid product every case starts from.

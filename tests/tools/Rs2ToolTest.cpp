@@ -82,7 +82,7 @@ TEST_F(ToolOnProduct, exit_codes_tell_errors_from_bad_usage) {
         {"frobnicate", 2},                                 // no such command
         {"info " + Quoted(folder.File("missing.xml")), 1}, // nothing there
         {"info " + Quoted(product.productXml + "?c=sigma0"), 1}, // bad choice
-        {"read " + Quoted(product.productXml) + " --window 20 0 10 1", 1},
+        {"read " + Quoted(product.productXml) + " --window 20 0 10 1", 2},
         {"read " + Quoted(product.productXml) +
              " --window 0 0 2 2 --channels 3",
          2},

@@ -4,6 +4,7 @@
 // multilooked). Memory holds one band whatever the image size; the file
 // appears under its name only once it is complete.
 
+#include "tools/rs2/CalibrationCheck.hpp"
 #include "tools/rs2/Commands.hpp"
 #include "tools/rs2/DatasetChoice.hpp"
 #include "tools/rs2/ExportGeoreferencing.hpp"
@@ -220,11 +221,13 @@ void WriteBackscatter(const host::Raster &raster, const ExportPlan &plan,
 
 void RunExport(ExportOptions options) {
     options.name = NameWithCalibration(options.name, options.calibration);
-    host::Raster raster = host::OpenRaster(options.name);
+    host::Raster raster = OpenDataset(options.name);
+    PartFile part(options.output, DatasetFiles(raster));
+    RequirePixels(raster, "export");
+    RequireAppliedCalibration(raster);
     ForgetOpenWarnings();
     const ExportPlan plan = PlanExport(raster, options);
     const host::GeoTiffGeoreferencing geo = OutputGeoreferencing(raster, plan);
-    PartFile part(options.output);
     {
         host::GeoTiffWriter writer(part.Path(), plan.width, plan.height,
                                    static_cast<int32_t>(plan.channels.size()),
@@ -262,7 +265,7 @@ void AddExportCommand(CLI::App &app) {
         ->add_option("--size", options.bufferSize,
                      "BW BH: output size (nearest neighbour)")
         ->expected(2)
-        ->check(CLI::PositiveNumber);
+        ->check(PositivePixels());
     command->add_option("--channels", options.channels, "e.g. 1,2")
         ->delimiter(',');
     command->add_flag("--db", options.decibels,
@@ -292,9 +295,14 @@ void AddExportCommand(CLI::App &app) {
         "samples they hold) and scales the georeferencing to match. The "
         "steps apply in this order: power, noise, looks, dB.\n"
         "The file is written as OUT.part-XXXXXX beside OUT and renamed when "
-        "complete; nothing is left behind on failure. A channel whose image "
-        "file is missing or unreadable fails the export rather than be "
-        "written as zeros.\n"
+        "complete; nothing is left behind on failure or interruption. An "
+        "existing OUT is replaced only when it is a regular file with write "
+        "permission (for root: any write bit in its mode) and none of the "
+        "dataset's own files; a symbolic link is refused, not followed. A "
+        "channel whose image file is missing or unreadable fails the export "
+        "rather than be written as zeros, and a calibration that was asked "
+        "for and cannot be applied (its table missing or unreadable) fails "
+        "it rather than be written as raw values.\n"
         "Examples:\n"
         "  rs2 export 'dir/product.xml?c=sigma' sigma0.tif\n"
         "  rs2 export dir sigma0_db.tif --calibration sigma --denoise --db\n"

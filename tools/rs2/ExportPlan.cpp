@@ -48,24 +48,6 @@ std::vector<int32_t> CheckedChannels(const host::Raster &raster,
     return channels;
 }
 
-host::Window CheckedWindow(const host::Raster &raster,
-                           const std::vector<int32_t> &w) {
-    if (w.empty())
-        return {0, 0, raster.Width(), raster.Height()};
-    if (w[2] < 1 || w[3] < 1)
-        throw CLI::ValidationError("--window",
-                                   "width and height must be at least 1");
-    if (w[0] < 0 || w[1] < 0 || w[2] > raster.Width() - w[0] ||
-        w[3] > raster.Height() - w[1])
-        throw CLI::ValidationError(
-            "--window",
-            "window " + std::to_string(w[0]) + " " + std::to_string(w[1]) +
-                " " + std::to_string(w[2]) + " " + std::to_string(w[3]) +
-                " does not lie within the " + std::to_string(raster.Width()) +
-                " x " + std::to_string(raster.Height()) + " raster");
-    return {w[0], w[1], w[2], w[3]};
-}
-
 Looks ParsedLooks(const std::string &text) {
     static const std::regex form("([0-9]{1,9})x([0-9]{1,9})");
     std::smatch parts;
@@ -80,11 +62,17 @@ Looks ParsedLooks(const std::string &text) {
     return looks;
 }
 
-std::string MetadataValue(const host::Raster &raster, const std::string &key) {
-    for (const auto &[entryKey, value] : raster.Metadata(1))
-        if (entryKey == key)
-            return value;
-    return "";
+// A block larger than the grid would average nothing more, and the rows of
+// one block are held in memory: so blocks fit the grid.
+Looks LooksWithinGrid(const Looks &looks, const ExportPlan &plan) {
+    if (looks.lines > plan.gridHeight || looks.columns > plan.gridWidth)
+        throw CLI::ValidationError(
+            "--looks",
+            std::to_string(looks.lines) + "x" + std::to_string(looks.columns) +
+                " blocks do not fit the " + std::to_string(plan.gridHeight) +
+                " lines by " + std::to_string(plan.gridWidth) +
+                " columns exported");
+    return looks;
 }
 
 // The calibration the dataset applies, as product.xml names it; empty when
@@ -156,7 +144,7 @@ void PlanBackscatter(const host::Raster &raster, const ExportOptions &options,
     if (!plan.backscatter)
         return;
     if (!options.looks.empty())
-        plan.looks = ParsedLooks(options.looks);
+        plan.looks = LooksWithinGrid(ParsedLooks(options.looks), plan);
     plan.powerRule = PowerRuleOf(plan.readType);
     if (options.denoise)
         plan.noise = NoisePerGridColumn(raster, plan);
@@ -171,12 +159,7 @@ void PlanBackscatter(const host::Raster &raster, const ExportOptions &options,
 
 ExportPlan PlanExport(const host::Raster &raster,
                       const ExportOptions &options) {
-    if (raster.Width() < 1 || raster.Height() < 1 || raster.ChannelCount() < 1)
-        throw std::runtime_error("the dataset has no pixels to export (" +
-                                 std::to_string(raster.Width()) + " x " +
-                                 std::to_string(raster.Height()) + ", " +
-                                 std::to_string(raster.ChannelCount()) +
-                                 " channels)");
+    RequirePixels(raster, "export");
     ExportPlan plan;
     plan.window = CheckedWindow(raster, options.window);
     plan.gridWidth =

@@ -1,10 +1,19 @@
+#include "tools/rs2/CalibrationCheck.hpp"
 #include "tools/rs2/Commands.hpp"
-
+#include "tools/rs2/DatasetChoice.hpp"
 #include "tools/rs2/DatasetJson.hpp"
+#include "tools/rs2/DatasetPaths.hpp"
+#include "tools/rs2/JsonText.hpp"
 
+#include "host/RasterServices.hpp"
+
+#include <algorithm>
 #include <cstdio>
+#include <cstdlib>
 #include <filesystem>
 #include <iostream>
+#include <regex>
+#include <utility>
 
 namespace {
 
@@ -20,9 +29,77 @@ std::string Entry(const json &info, const std::string &key) {
 
 void Heading(const char *title) { std::printf("\n%s\n", title); }
 
+// Decimals: the text with its trailing zeros dropped, but at least two.
+std::string TrimmedDecimals(std::string text) {
+    const size_t point = text.find('.');
+    if (point == std::string::npos)
+        return text;
+    const size_t keep = std::max(text.find_last_not_of('0') + 1, point + 3);
+    return text.substr(0, std::min(keep, text.size()));
+}
+
+// Product.xml writes many values in exponent form ("3.64000000e+01");
+// people read them as plain decimals ("36.40"), with the precision the
+// text gives. Other texts, and exponents too large to spell out, stay.
+std::string PlainDecimal(const std::string &text) {
+    static const std::regex exponentForm(
+        "[-+]?[0-9]+(\\.([0-9]+))?[eE]([-+]?[0-9]+)");
+    std::smatch parts;
+    if (!std::regex_match(text, parts, exponentForm))
+        return text;
+    const int exponent = std::atoi(parts[3].str().c_str());
+    if (exponent < -15 || exponent > 15)
+        return text;
+    const int decimals =
+        std::max(static_cast<int>(parts[2].length()) - exponent, 0);
+    char plain[64];
+    std::snprintf(plain, sizeof plain, "%.*f", decimals,
+                  std::strtod(text.c_str(), nullptr));
+    return TrimmedDecimals(plain);
+}
+
 void Row(const std::string &label, const std::string &value) {
     if (!value.empty())
-        std::printf("  %-22s %s\n", label.c_str(), value.c_str());
+        std::printf("  %-22s %s\n", label.c_str(), PlainDecimal(value).c_str());
+}
+
+std::string ChannelTypeName(int32_t code) {
+    switch (code) {
+    case kChanUInt8:
+        return "uint8";
+    case kChanUInt16:
+        return "uint16";
+    case kChanInt16:
+        return "int16";
+    case kChanInt32:
+        return "int32";
+    case kChanUInt32:
+        return "uint32";
+    case kChanFloat32:
+        return "float32";
+    case kChanComplexInt16:
+        return "complex int16";
+    case kChanComplexFloat32:
+        return "complex float32";
+    }
+    return "type " + std::to_string(code);
+}
+
+// The coordinate system with its EPSG code where the text fixes one: WGS 84
+// geographic, or WGS 84 UTM with the hemisphere its latitude band gives
+// (bands C to M south, N to X north).
+std::string GeosysWithEpsg(const std::string &geosys) {
+    static const std::regex utm("UTM ([0-9]{1,2}) ([C-HJ-NP-X]) D000");
+    std::smatch parts;
+    int epsg = 0;
+    if (geosys == "LONG D000") {
+        epsg = 4326;
+    } else if (std::regex_match(geosys, parts, utm)) {
+        const int zone = std::atoi(parts[1].str().c_str());
+        if (zone >= 1 && zone <= 60)
+            epsg = (parts[2].str()[0] >= 'N' ? 32600 : 32700) + zone;
+    }
+    return epsg == 0 ? geosys : geosys + " (EPSG:" + std::to_string(epsg) + ")";
 }
 
 void RowsFromEntries(
@@ -36,8 +113,9 @@ void RowsFromEntries(
 // should see at once that an image is missing (its channel reads nothing).
 std::string FileText(const std::string &path) {
     std::error_code error;
-    return std::filesystem::is_regular_file(path, error) ? path
-                                                         : path + " (missing)";
+    const std::string tidy = TidyPath(path);
+    return std::filesystem::is_regular_file(path, error) ? tidy
+                                                         : tidy + " (missing)";
 }
 
 std::string JoinFiles(const json &list) {
@@ -47,7 +125,8 @@ std::string JoinFiles(const json &list) {
     return text;
 }
 
-void PrintSummary(const json &info) {
+// unapplied: why a calibration the name asked for is not applied, or "".
+void PrintSummary(const json &info, const std::string &unapplied) {
     std::printf("%s\n", info["name"].get<std::string>().c_str());
     Heading("Product");
     RowsFromEntries(info, {{"type", "ProductType"},
@@ -76,7 +155,9 @@ void PrintSummary(const json &info) {
                            {"slant range near (m)", "SlantRangeNearEdge"},
                            {"slant range far (m)", "SlantRangeFarEdge"}});
     Heading("Calibration");
-    RowsFromEntries(info, {{"applied", "SAR_Calibration"}});
+    const std::string applied = Entry(info, "SAR_Calibration");
+    Row("applied",
+        unapplied.empty() ? applied : applied + " (" + unapplied + ")");
     std::string offered;
     for (const auto &type : info["calibration_types"]) {
         // Entries read ":Calibration Type:<kind>"; people want the kind.
@@ -88,10 +169,10 @@ void PrintSummary(const json &info) {
     Heading("Channels");
     for (const auto &channel : info["channels"])
         Row("channel " + std::to_string(channel["number"].get<int>()),
-            channel["description"].get<std::string>() + " (type " +
-                std::to_string(channel["type"].get<int>()) + ")");
+            channel["description"].get<std::string>() + " (" +
+                ChannelTypeName(channel["type"].get<int>()) + ")");
     Heading("Georeferencing");
-    Row("coordinate system", info["projection"]["geosys"]);
+    Row("coordinate system", GeosysWithEpsg(info["projection"]["geosys"]));
     Row("ground control points", std::to_string(info["gcps"]["points"].size()));
     Row("RPC model", info["rpc"].is_null() ? "none" : "yes");
     Row("orbit state vectors",
@@ -124,14 +205,21 @@ void AddInfoCommand(CLI::App &app) {
     command->footer(
         "NAME is product.xml, the product folder, product.xml?c=sigma "
         "(beta, gamma), product.xml:Calibration Type:Sigma Nought or a "
-        "file:// URI.\nExamples:\n  rs2 info dir\n  rs2 info "
+        "file:// URI. A calibration the name asks for that cannot be "
+        "applied is told on stderr and shown beside the calibration applied. "
+        "JSON text is UTF-8: a byte of a product file that is not part of "
+        "UTF-8 text is taken as Latin-1 (byte 0xE9 becomes U+00E9).\n"
+        "Examples:\n  rs2 info dir\n  rs2 info "
         "'dir/product.xml?c=sigma' --json");
     command->callback([] {
-        host::Raster raster = host::OpenRaster(name);
+        host::Raster raster = OpenDataset(name);
+        const std::string unapplied = UnappliedCalibration(raster);
+        if (!unapplied.empty())
+            std::cerr << "rs2: warning: " << unapplied << "\n";
         nlohmann::json info = DescribeDataset(raster);
         if (asJson)
-            std::cout << info.dump(2) << "\n";
+            std::cout << JsonText(std::move(info), 2) << "\n";
         else
-            PrintSummary(info);
+            PrintSummary(info, unapplied);
     });
 }

@@ -5,6 +5,7 @@
 // colour stretched on its own between robust percentiles (DecibelStretch).
 
 #include "tools/rs2/Backscatter.hpp"
+#include "tools/rs2/CalibrationCheck.hpp"
 #include "tools/rs2/Commands.hpp"
 #include "tools/rs2/DatasetChoice.hpp"
 #include "tools/rs2/DecibelStretch.hpp"
@@ -277,8 +278,11 @@ const ChannelPreview &PreviewOf(const std::vector<ChannelPreview> &previews,
 }
 
 void RunQuicklook(const QuicklookOptions &options) {
-    host::Raster raster = host::OpenRaster(
-        NameWithCalibration(options.name, options.calibration));
+    host::Raster raster =
+        OpenDataset(NameWithCalibration(options.name, options.calibration));
+    PartFile part(options.output, DatasetFiles(raster));
+    RequirePixels(raster, "preview");
+    RequireAppliedCalibration(raster);
     ForgetOpenWarnings();
     const std::vector<int32_t> shown = ShownChannels(raster, options);
     const PreviewSize size =
@@ -291,7 +295,6 @@ void RunQuicklook(const QuicklookOptions &options) {
         colours.push_back(&PreviewOf(previews, channel));
     const Image8 image = Composite(colours, size);
 
-    PartFile part(options.output);
     WritePng(part.Path(), image);
     part.Commit();
     PrintSummary(options.output, size, colours);
@@ -329,7 +332,11 @@ void AddQuicklookCommand(CLI::App &app) {
         "channel is mid-grey. Datasets that name DefaultRed, "
         "DefaultGreen and DefaultBlue are shown as that RGB composite "
         "unless --channel is given. The file is written as OUT.part-XXXXXX "
-        "beside OUT and renamed when complete.\n"
+        "beside OUT and renamed when complete; OUT is replaced only when it "
+        "is a regular file with write permission (for root: any write bit "
+        "in its mode) and none of the dataset's own files, and a symbolic "
+        "link is refused, not followed. A calibration that was asked for and "
+        "cannot be applied fails the preview.\n"
         "Prints one line: OUT, its size, the channels shown and the dB "
         "range of each colour's stretch.\nExamples:\n  rs2 quicklook dir "
         "preview.png\n  rs2 quicklook dir hv.png --channel 2 --calibration "

@@ -1,12 +1,16 @@
+#include "tools/rs2/CalibrationCheck.hpp"
 #include "tools/rs2/Commands.hpp"
 #include "tools/rs2/DatasetChoice.hpp"
+#include "tools/rs2/JsonText.hpp"
 
 #include "host/Raster.hpp"
+#include "host/RasterServices.hpp"
 
 #include <nlohmann/json.hpp>
 
 #include <iostream>
 #include <stdexcept>
+#include <utility>
 
 namespace {
 
@@ -34,43 +38,57 @@ void PrintSamples(const std::vector<Sample> &data, int32_t width,
     }
 }
 
+// Calibrated channels hold real samples, which the integer read leaves
+// untouched: --int on them would print whatever the buffer held.
+bool ReadsReals(const ReadOptions &options, int32_t type) {
+    const bool calibrated = type == kChanFloat32 || type == kChanComplexFloat32;
+    if (options.integer && calibrated)
+        throw CLI::ValidationError(
+            "--int", "the channels hold calibrated real samples; read them "
+                     "without --int");
+    return options.real || calibrated;
+}
+
+template <typename Sample>
+void PrintRead(const ReadOptions &options, nlohmann::json result,
+               const std::vector<Sample> &data, int32_t width, int32_t height) {
+    if (options.json) {
+        result["data"] = data;
+        std::cout << JsonText(std::move(result)) << "\n";
+    } else {
+        PrintSamples(data, width, height,
+                     data.size() / (static_cast<size_t>(width) * height));
+    }
+}
+
 void RunRead(const ReadOptions &options) {
-    host::Raster raster = host::OpenRaster(options.name);
-    host::Window window{options.window[0], options.window[1], options.window[2],
-                        options.window[3]};
-    int32_t width =
+    host::Raster raster = OpenDataset(options.name);
+    const std::string unapplied = UnappliedCalibration(raster);
+    if (!unapplied.empty())
+        std::cerr << "rs2: warning: " << unapplied << "\n";
+    ForgetOpenWarnings();
+    const host::Window window = CheckedWindow(raster, options.window);
+    const int32_t width =
         options.bufferSize.empty() ? window.width : options.bufferSize[0];
-    int32_t height =
+    const int32_t height =
         options.bufferSize.empty() ? window.height : options.bufferSize[1];
     const std::vector<int32_t> channels =
         ChosenChannels(raster, options.channels);
-    int32_t type = raster.ChannelType(channels.front());
-    // Real channels (4, 9) are read as floats, the others as integers,
-    // unless the user chooses.
-    bool real = options.real || (!options.integer && (type == 4 || type == 9));
-    nlohmann::json result{{"type", type},
-                          {"width", width},
-                          {"height", height},
-                          {"channels", channels}};
-    if (real) {
-        std::vector<float> data =
+    const int32_t type = raster.ChannelType(channels.front());
+    const nlohmann::json result{{"type", type},
+                                {"width", width},
+                                {"height", height},
+                                {"channels", channels}};
+    if (ReadsReals(options, type)) {
+        const std::vector<float> data =
             raster.ReadReal32(window, width, height, channels);
-        if (options.json) {
-            result["data"] = data;
-            std::cout << result.dump() << "\n";
-        } else {
-            PrintSamples(data, width, height,
-                         data.size() / (static_cast<size_t>(width) * height));
-        }
+        RequireCompleteReads();
+        PrintRead(options, result, data, width, height);
     } else {
-        std::vector<int32_t> data =
+        const std::vector<int32_t> data =
             raster.ReadInt32(window, width, height, channels);
-        if (options.json) {
-            result["data"] = data;
-            std::cout << result.dump() << "\n";
-        } else {
-            PrintSamples(data, width, height, channels.size());
-        }
+        RequireCompleteReads();
+        PrintRead(options, result, data, width, height);
     }
 }
 
@@ -86,7 +104,7 @@ void AddReadCommand(CLI::App &app) {
         ->required();
     command->add_option("--size", options.bufferSize, "BW BH (output size)")
         ->expected(2)
-        ->check(CLI::PositiveNumber);
+        ->check(PositivePixels());
     command->add_option("--channels", options.channels, "e.g. 1,2")
         ->delimiter(',');
     auto *real =
@@ -96,7 +114,12 @@ void AddReadCommand(CLI::App &app) {
     command->add_flag("--json", options.json,
                       "print {type, width, height, channels, data}");
     command->footer("Prints one line per row, or with --json the buffer as "
-                    "the driver wrote it.\nExamples:\n  rs2 read dir --window "
+                    "the driver wrote it. Calibrated channels are read as "
+                    "floats, others as integers unless --real. A channel "
+                    "whose image cannot be read fails the read; a "
+                    "calibration that was asked for and cannot be applied "
+                    "is told as a warning, and the stored samples are "
+                    "printed.\nExamples:\n  rs2 read dir --window "
                     "0 0 4 3\n  rs2 read 'dir?c=sigma' --window 0 0 800 600 "
                     "--size 8 6 --json");
     command->callback([] { RunRead(options); });

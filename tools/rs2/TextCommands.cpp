@@ -1,4 +1,5 @@
 #include "tools/rs2/Commands.hpp"
+#include "tools/rs2/DatasetChoice.hpp"
 
 #include "host/Raster.hpp"
 
@@ -11,7 +12,7 @@ void AddTextCommands(CLI::App &app) {
     text->add_option("NAME", textName, "dataset name")->required();
     text->footer("Example: rs2 text dir/product.xml | grep noiseLevelValues");
     text->callback([] {
-        host::Raster raster = host::OpenRaster(textName);
+        host::Raster raster = OpenDataset(textName);
         for (const std::string &line : raster.TextLines())
             std::printf("%s\n", line.c_str());
     });
@@ -23,7 +24,7 @@ void AddTextCommands(CLI::App &app) {
     segments->footer("Prints one line per segment: type, number, "
                      "description.\nExample: rs2 segments dir");
     segments->callback([] {
-        host::Raster raster = host::OpenRaster(segmentsName);
+        host::Raster raster = OpenDataset(segmentsName);
         for (const host::Segment &segment : raster.Segments())
             std::printf("%d %d %s\n", segment.type, segment.number,
                         segment.description.c_str());
