@@ -221,6 +221,9 @@ void WriteBackscatter(const host::Raster &raster, const ExportPlan &plan,
 
 void RunExport(ExportOptions options) {
     options.name = NameWithCalibration(options.name, options.calibration);
+    // What the target is can be told before the dataset is opened; whether
+    // it is one of the dataset's files only after.
+    RequireReplaceableTarget(options.output, {});
     host::Raster raster = OpenDataset(options.name);
     PartFile part(options.output, DatasetFiles(raster));
     RequirePixels(raster, "export");

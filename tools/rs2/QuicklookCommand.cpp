@@ -278,6 +278,7 @@ const ChannelPreview &PreviewOf(const std::vector<ChannelPreview> &previews,
 }
 
 void RunQuicklook(const QuicklookOptions &options) {
+    RequireReplaceableTarget(options.output, {});
     host::Raster raster =
         OpenDataset(NameWithCalibration(options.name, options.calibration));
     PartFile part(options.output, DatasetFiles(raster));
