@@ -63,9 +63,13 @@ void PrintRead(const ReadOptions &options, nlohmann::json result,
 
 void RunRead(const ReadOptions &options) {
     host::Raster raster = OpenDataset(options.name);
+    // Said once the read has succeeded, so that a failing read ends with
+    // its one error line.
     const std::string unapplied = UnappliedCalibration(raster);
-    if (!unapplied.empty())
-        std::cerr << "rs2: warning: " << unapplied << "\n";
+    const auto warnUnapplied = [&unapplied] {
+        if (!unapplied.empty())
+            std::cerr << "rs2: warning: " << unapplied << "\n";
+    };
     ForgetOpenWarnings();
     const host::Window window = CheckedWindow(raster, options.window);
     const int32_t width =
@@ -83,11 +87,13 @@ void RunRead(const ReadOptions &options) {
         const std::vector<float> data =
             raster.ReadReal32(window, width, height, channels);
         RequireCompleteReads();
+        warnUnapplied();
         PrintRead(options, result, data, width, height);
     } else {
         const std::vector<int32_t> data =
             raster.ReadInt32(window, width, height, channels);
         RequireCompleteReads();
+        warnUnapplied();
         PrintRead(options, result, data, width, height);
     }
 }
