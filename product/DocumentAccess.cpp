@@ -203,12 +203,14 @@ class ProductDomParser : public XercesDOMParser {
         Refuse("it declares a document type");
     }
 
+    // The parser reports the end of every element, an empty one included,
+    // so every start counts one level.
     void startElement(const xercesc::XMLElementDecl &element,
                       unsigned int urlId, const XMLCh *prefix,
                       const xercesc::RefVectorOf<xercesc::XMLAttr> &attributes,
                       XMLSize_t attributeCount, bool isEmpty,
                       bool isRoot) override {
-        if (!isEmpty && ++depth > kMaxElementDepth)
+        if (++depth > kMaxElementDepth)
             Refuse("its elements nest more than " +
                    std::to_string(kMaxElementDepth) + " deep");
         XercesDOMParser::startElement(element, urlId, prefix, attributes,

@@ -130,6 +130,17 @@ std::string DeeplyNested() {
     return text;
 }
 
+// Many empty elements, each of which once lowered the depth the parse
+// counted, and then elements nested past the limit.
+std::string EmptyThenNested(const std::string &root) {
+    std::string text = "<" + root + "><productType>SGF</productType>";
+    for (int i = 0; i < 1000; ++i)
+        text += "<e/>";
+    for (int i = 0; i < 150; ++i)
+        text += "<a>";
+    return text;
+}
+
 TEST(HostileXml, hostile_documents_are_refused_naming_the_file) {
     LoopbackListener listener;
     const struct Case {
@@ -146,6 +157,10 @@ TEST(HostileXml, hostile_documents_are_refused_naming_the_file) {
         {"look-up table entity", "lutSigma.xml",
          WithEntity("file:///etc/passwd")},
         {"deep nesting", "product.xml", DeeplyNested()},
+        {"deep nesting after empty elements", "product.xml",
+         EmptyThenNested("product")},
+        {"deep nesting after empty elements in a table", "lutSigma.xml",
+         EmptyThenNested("lut")},
     };
     for (const Case &c : cases) {
         ProductFolder folder;
