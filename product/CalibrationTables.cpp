@@ -6,6 +6,7 @@
 #include "product/CalibrationTables.hpp"
 
 #include "host/HostMemory.hpp"
+#include "product/BoundedFileRead.hpp"
 #include "product/DescriptionFacts.hpp"
 
 #include "host/ErrorReports.hpp"
@@ -53,6 +54,14 @@ constexpr char kLookupTableMissing[] =
 constexpr char kLookupTableUnreadable[] =
     "The LUT file %s can not be read.\n"
     "The image will be loaded without calibration";
+constexpr char kLookupTableTooLarge[] =
+    "The LUT file %s holds more than %s, far more than a table of one gain "
+    "per column needs; it is not read";
+
+// The largest table file read. A real one holds about 200 KB for 18,000
+// columns; the limit leaves room for tables of a few million gains while the
+// parse of the largest accepted file stays well under a GiB.
+constexpr std::size_t kMaxLookupTableBytes = 48u << 20;
 
 // The path of the table file whose lookupTable attribute contains pattern,
 // joined to the product directory (which ends in its separator), as a host
@@ -128,7 +137,15 @@ bool IsLookupTableDocument(const xercesc::DOMDocument *document) {
 // Reads a table file while the product description's parse holds the XML
 // platform; null when the file gives no table document.
 std::unique_ptr<LookupTable> ParseLookupTableFile(const char *path) {
-    DocumentParse parse(path, DocumentParse::Platform::AlreadyInitialized);
+    const FileBytes file = ReadFileUpTo(path, kMaxLookupTableBytes);
+    if (file.status == FileReadStatus::TooLarge)
+        IMPError(-1, host::kWarning, "%s",
+                 MkName(_(kLookupTableTooLarge), path,
+                        SizeText(kMaxLookupTableBytes).c_str()));
+    if (file.status != FileReadStatus::Read)
+        return nullptr;
+    DocumentParse parse(file.bytes, path,
+                        DocumentParse::Platform::AlreadyInitialized);
     const xercesc::DOMDocument *document = parse.Document();
     if (!IsLookupTableDocument(document))
         return nullptr;

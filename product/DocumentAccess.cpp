@@ -2,12 +2,12 @@
 
 #include "host/ErrorReports.hpp"
 #include "host/TextServices.hpp"
+#include "product/BoundedFileRead.hpp"
 
 #include <cstring>
 #include <string>
 #include <string_view>
 #include <strings.h>
-#include <sys/stat.h>
 #include <unordered_map>
 #include <utility>
 
@@ -19,7 +19,7 @@
 #include <xercesc/dom/DOMNamedNodeMap.hpp>
 #include <xercesc/dom/DOMNode.hpp>
 #include <xercesc/dom/DOMNodeList.hpp>
-#include <xercesc/framework/LocalFileInputSource.hpp>
+#include <xercesc/framework/MemBufInputSource.hpp>
 #include <xercesc/framework/XMLAttr.hpp>
 #include <xercesc/framework/XMLElementDecl.hpp>
 #include <xercesc/internal/XMLScanner.hpp>
@@ -147,9 +147,8 @@ const DOMElement *FindElement(const DOMDocument *document, const char *tag,
     return nullptr;
 }
 
-// Releases a buffer that XMLString::transcode allocated: narrow text made of
-// XMLCh text, or XMLCh text made of narrow text (in the local code page, as
-// the parser reads the paths it is given).
+// Releases a buffer that XMLString::transcode allocated: narrow text in the
+// local code page made of XMLCh text.
 template <class To, class From> struct Transcoded {
     To *text;
     explicit Transcoded(const From *source)
@@ -234,27 +233,41 @@ class ProductDomParser : public XercesDOMParser {
     int depth = 0; // elements open at the point of the parse
 };
 
-// Only a regular file is handed to the parser: a pipe or a device named like
-// a product file would block the parse or never end it.
-bool IsRegularFile(const char *path) {
-    struct stat info {};
-    return path != nullptr && stat(path, &info) == 0 && S_ISREG(info.st_mode);
+// Reports the refusal; an error report does not come back.
+void RefuseDocument(const char *path, const std::string &reason) {
+    IMPError(kErrUnreadableFile, host::kError,
+             "Refused %s: %s, which the XML files of a product never do", path,
+             reason.c_str());
 }
 
-// Parses the file at path, always as a local file: a path that happens to
-// read as a URL is never fetched. A refused document is reported with the
-// host's error report.
-void ParseLocalFile(ProductDomParser &parser, const char *path) {
-    Transcoded<XMLCh, char> wide(path);
+// Parses bytes read from path. The parser is handed the bytes, never the
+// path: a path that happens to read as a URL is never fetched, and a path
+// that is not text in any encoding is read all the same. A refused document
+// is reported with the host's error report.
+void ParseBytes(ProductDomParser &parser, const std::string &bytes,
+                const char *path) {
+    const XmlTranscode label(path);
+    xercesc::MemBufInputSource source(
+        reinterpret_cast<const XMLByte *>(bytes.data()), bytes.size(), label);
     try {
-        parser.parse(xercesc::LocalFileInputSource(wide.text));
+        parser.parse(source);
     } catch (const ProductDomParser::Refused &refused) {
-        IMPError(kErrUnreadableFile, host::kError,
-                 "Refused %s: %s (line %llu), which the XML files of a "
-                 "product never do",
-                 path, refused.reason.c_str(),
-                 static_cast<unsigned long long>(refused.line));
+        RefuseDocument(path, refused.reason + " (line " +
+                                 std::to_string(refused.line) + ")");
     }
+}
+
+// The bytes of the product description at path; null when there is no
+// regular file to read there. One too large to be a product description is
+// refused unread.
+std::unique_ptr<std::string> DescriptionBytes(const char *path) {
+    FileBytes file = ReadFileUpTo(path, kMaxDescriptionBytes);
+    if (file.status == FileReadStatus::TooLarge)
+        RefuseDocument(path,
+                       "it holds more than " + SizeText(kMaxDescriptionBytes));
+    if (file.status != FileReadStatus::Read)
+        return nullptr;
+    return std::make_unique<std::string>(std::move(file.bytes));
 }
 
 // The text content of node. getTextContent copies it into the document's
@@ -332,7 +345,17 @@ bool HasMatchingAttribute(const DOMNode *element, AttributeMatch rule,
 
 } // namespace
 
-DocumentParse::DocumentParse(const char *path, Platform platform) {
+DocumentParse::DocumentParse(const char *path, Platform platform)
+    : DocumentParse(DescriptionBytes(path).get(), path, platform) {}
+
+DocumentParse::DocumentParse(const std::string &bytes, const char *path,
+                             Platform platform)
+    : DocumentParse(&bytes, path, platform) {}
+
+DocumentParse::DocumentParse(const std::string *bytes, const char *path,
+                             Platform platform) {
+    if (bytes == nullptr)
+        return;
     // A nested parse relies on the initialisation of the parse around it;
     // should there be none, it holds one of its own rather than run the
     // parser on an uninitialised platform.
@@ -344,16 +367,7 @@ DocumentParse::DocumentParse(const char *path, Platform platform) {
         platformHeld = true;
     }
     try {
-        auto productParser = std::make_unique<ProductDomParser>();
-        ProductDomParser &parsing = *productParser;
-        parser = std::move(productParser);
-        if (IsRegularFile(path))
-            ParseLocalFile(parsing, path);
-        document = parser->getDocument();
-        if (document != nullptr) {
-            index = std::make_unique<ElementIndex>(document);
-            LiveIndexes().emplace_back(document, index.get());
-        }
+        Parse(*bytes, path);
     } catch (...) {
         // The destructor does not run for a constructor that throws.
         ForgetIndex(index.get());
@@ -368,6 +382,18 @@ DocumentParse::DocumentParse(const char *path, Platform platform) {
         if (platformHeld)
             ORV_XMLUtil::Terminate();
         platformHeld = false;
+    }
+}
+
+void DocumentParse::Parse(const std::string &bytes, const char *path) {
+    auto productParser = std::make_unique<ProductDomParser>();
+    ProductDomParser &parsing = *productParser;
+    parser = std::move(productParser);
+    ParseBytes(parsing, bytes, path);
+    document = parser->getDocument();
+    if (document != nullptr) {
+        index = std::make_unique<ElementIndex>(document);
+        LiveIndexes().emplace_back(document, index.get());
     }
 }
 

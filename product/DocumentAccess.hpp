@@ -2,6 +2,7 @@
 
 #include "host/XmlUtil.hpp"
 
+#include <cstddef>
 #include <memory>
 #include <string>
 #include <vector>
@@ -11,6 +12,12 @@
 #include <xercesc/parsers/XercesDOMParser.hpp>
 
 class ElementIndex;
+
+/// The largest product description parsed. A real one holds about half a
+/// MiB and one with a dense grid of 200,000 tie points about 42 MiB; the
+/// parsed document takes several times its file's size, so the limit keeps
+/// the parse of the largest accepted file well under a GiB.
+constexpr std::size_t kMaxDescriptionBytes = 48u << 20;
 
 /// A parsed XML file of a product. The document lives exactly as long as
 /// this object. A top-level parse (the product description) holds one XML
@@ -28,8 +35,13 @@ class DocumentParse {
   public:
     enum class Platform { Initialize, AlreadyInitialized };
 
+    /// Parses the file at path, a product description: one larger than
+    /// kMaxDescriptionBytes is refused as above, unread.
     explicit DocumentParse(const char *path,
                            Platform platform = Platform::Initialize);
+    /// Parses bytes read from the file path names (which only labels it).
+    DocumentParse(const std::string &bytes, const char *path,
+                  Platform platform);
     ~DocumentParse();
     DocumentParse(const DocumentParse &) = delete;
     DocumentParse &operator=(const DocumentParse &) = delete;
@@ -39,6 +51,11 @@ class DocumentParse {
     xercesc::DOMDocument *Document() const { return document; }
 
   private:
+    // Parses *bytes; without bytes (no readable file) there is no document.
+    DocumentParse(const std::string *bytes, const char *path,
+                  Platform platform);
+    void Parse(const std::string &bytes, const char *path);
+
     bool platformHeld = false;
     std::unique_ptr<xercesc::XercesDOMParser> parser;
     xercesc::DOMDocument *document = nullptr;

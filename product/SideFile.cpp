@@ -1,13 +1,13 @@
 #include "product/SideFile.hpp"
 
+#include "host/ErrorReports.hpp"
 #include "host/StringLists.hpp"
 #include "host/fileio/File.hpp"
+#include "product/BoundedFileRead.hpp"
 #include "product/DocumentAccess.hpp"
 #include "product/ProductReader.hpp"
 #include "product/StringListKeeper.hpp"
 
-#include <fstream>
-#include <iterator>
 #include <memory>
 #include <string>
 
@@ -28,13 +28,21 @@ std::string SideFilePath(const char *productPath) {
     return sideFile->GetFileName();
 }
 
-// The whole file; an unreadable file reads as empty.
+// The largest side file read. A real one holds a few KB of key = value
+// lines; the limit leaves room for generated ones of many thousand lines
+// while what a file can cost stays bounded.
+constexpr std::size_t kMaxSideFileBytes = 16u << 20;
+
+// The whole file; an unreadable file reads as empty, and so does one too
+// large to be a side file, after a warning naming it.
 std::string ReadWholeFile(const std::string &path) {
-    std::ifstream stream(path);
-    if (!stream)
-        return std::string();
-    return std::string(std::istreambuf_iterator<char>(stream),
-                       std::istreambuf_iterator<char>());
+    FileBytes file = ReadFileUpTo(path.c_str(), kMaxSideFileBytes);
+    if (file.status == FileReadStatus::TooLarge)
+        IMPError(-1, host::kWarning,
+                 "The side file %s holds more than %s, far more than a "
+                 "product's description needs; it is not read",
+                 path.c_str(), SizeText(kMaxSideFileBytes).c_str());
+    return std::move(file.bytes);
 }
 
 // Lines that describe the archive's band layout, or that a conversion from

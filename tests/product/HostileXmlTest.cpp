@@ -9,7 +9,9 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <arpa/inet.h>
+#include <filesystem>
 #include <fstream>
 #include <iterator>
 #include <memory>
@@ -19,6 +21,7 @@
 #include <string>
 #include <sys/socket.h>
 #include <unistd.h>
+#include <vector>
 
 namespace {
 
@@ -199,6 +202,47 @@ TEST(HostileXml, references_of_ordinary_text_are_not_limited) {
     text.insert(root + 1, "<note>" + references + "</note>");
     folder.Write("product.xml", text);
     EXPECT_EQ(LoadFailure(folder, "sigma"), "");
+}
+
+// Files far larger than any real one are refused without being read, so a
+// sparse file of a few GiB costs neither the memory nor the time of its
+// size.
+TEST(HostileXml, files_past_their_size_limit_are_refused_unread) {
+    constexpr std::uintmax_t kSparseSize = 3ull << 30;
+    const struct Case {
+        const char *file;
+        const char *failure; // of the load; "" when it loads
+        const char *warning; // a warning the load gives; "" for none
+        const char *calibration;
+    } cases[] = {
+        {"product.xml", ": it holds more than 48 MiB", "", ""},
+        {"lutSigma.xml", "", " holds more than 48 MiB", "None"},
+        {"ProductDescription.self", "", " holds more than 16 MiB",
+         "Sigma Nought"},
+    };
+    for (const Case &c : cases) {
+        ProductFolder folder;
+        const std::string path = folder.Write(c.file, "<lut/>");
+        std::filesystem::resize_file(path, kSparseSize);
+        host::ClearWarnings();
+        ProductReader reader;
+        try {
+            std::unique_ptr<ZirOdi2CalibImage> model(LoadProduct(
+                reader, folder.product.productXml.c_str(), "sigma"));
+            ASSERT_NE(model, nullptr) << c.file;
+            EXPECT_STREQ(c.failure, "") << c.file;
+            EXPECT_STREQ(model->GetCalibrationType(), c.calibration);
+        } catch (const host::ReportedError &report) {
+            EXPECT_TRUE(Contains(report.what(), "Refused " + path + c.failure))
+                << report.what();
+        }
+        const std::vector<std::string> warnings = host::Warnings();
+        const bool warned =
+            std::any_of(warnings.begin(), warnings.end(), [&](const auto &w) {
+                return Contains(w, path + c.warning);
+            });
+        EXPECT_EQ(warned, *c.warning != '\0') << c.file;
+    }
 }
 
 } // namespace
