@@ -57,6 +57,9 @@ constexpr char kLookupTableUnreadable[] =
 constexpr char kLookupTableTooLarge[] =
     "The LUT file %s holds more than %s, far more than a table of one gain "
     "per column needs; it is not read";
+constexpr char kLookupTableTooShort[] =
+    "The LUT file %s has %zu gains for %lld columns.\n"
+    "The image will be loaded without calibration";
 
 // The largest table file read. A real one holds about 200 KB for 18,000
 // columns; the limit leaves room for tables of a few million gains while the
@@ -163,6 +166,20 @@ std::unique_ptr<LookupTable> ParseLookupTableFile(const char *path) {
 void WarnWithoutCalibration(ZirOdi2CalibImage *model, const char *message) {
     IMPError(-1, host::kWarning, "%s", message);
     model->SetCalibrationType(kNoCalibration);
+}
+
+// The number of columns a calibration table must cover: the width of the
+// model's first image, or, when no image opens, the width product.xml
+// declares; 0 when neither is known.
+long long ImageColumns(const xercesc::DOMDocument *document,
+                       ZirOdi2CalibImage &model) {
+    if (const int32_t width = model.Width(); width > 0)
+        return width;
+    const std::string declared =
+        NodeText(FirstElementByTag(document, "numberOfSamplesPerLine"));
+    char *end = nullptr;
+    const long long columns = std::strtoll(declared.c_str(), &end, 10);
+    return end != declared.c_str() && columns > 0 ? columns : 0;
 }
 
 float IncidenceDegrees(float beta, float sigma, IncidenceFormula formula) {
@@ -302,6 +319,13 @@ void LoadCalibration(const xercesc::DOMDocument *document,
     if (table == nullptr) {
         WarnWithoutCalibration(model,
                                MkName(_(kLookupTableUnreadable), path.get()));
+        return;
+    }
+    const long long columns = ImageColumns(document, *model);
+    if (table->Size() < static_cast<unsigned long long>(columns)) {
+        WarnWithoutCalibration(model,
+                               MkName(_(kLookupTableTooShort), path.get(),
+                                      table->Size(), columns));
         return;
     }
     model->CalibrationTable() = *table;

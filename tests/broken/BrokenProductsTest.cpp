@@ -130,11 +130,12 @@ TEST(BrokenProducts,
         else
             EXPECT_FLOAT_EQ(alternating[x].get<float>(),
                             CalibratedSample(x, -4.0f));
-        // Three words: three gains of 0, then the neutral gain past the end.
-        if (x < 3)
-            EXPECT_TRUE(words[x].is_null());
+        // Three words, then 13 gains of 2: the numbers fill the first
+        // columns and the last three gains stay 0.
+        if (x < rs2test::kCaseWidth - 3)
+            EXPECT_FLOAT_EQ(words[x].get<float>(), CalibratedSample(x, 2.0f));
         else
-            EXPECT_FLOAT_EQ(words[x].get<float>(), CalibratedSample(x, 1.0f));
+            EXPECT_TRUE(words[x].is_null());
     }
 }
 

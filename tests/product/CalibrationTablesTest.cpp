@@ -5,6 +5,8 @@
 #include "model/LookupTable.hpp"
 #include "model/ProductVariants.hpp"
 #include "product/DocumentAccess.hpp"
+#include "product/ProductReader.hpp"
+#include "tests/support/CommandRun.hpp"
 #include "tests/support/HostLists.hpp"
 #include "tests/support/TempDir.hpp"
 #include "tests/support/TestFiles.hpp"
@@ -197,6 +199,14 @@ TEST(CalibrationTables, missing_table_loads_without_calibration_and_warns) {
          unreadable},
         {"the named file has no gains", sigmaOnly,
          "<lut><offset>0</offset></lut>", unreadable},
+        {"fewer gains than the declared columns",
+         DescriptionNaming({{"kind=\"Sigma Nought\"", "lutSigma.xml"}})
+             .insert(9, "<numberOfSamplesPerLine> 16 "
+                        "</numberOfSamplesPerLine>"),
+         "<lut><offset>0</offset><gains>2 2 2</gains></lut>",
+         "The LUT file " + dir.File("lutSigma.xml") +
+             " has 3 gains for 16 columns.\n"
+             "The image will be loaded without calibration"},
     };
     for (const Case &c : cases) {
         WriteFile(dir.File("product.xml"), c.description);
@@ -275,6 +285,37 @@ TEST(CalibrationTables,
     // No document, no list.
     EXPECT_EQ(ListCalibrationTypes(nullptr), nullptr);
     EXPECT_EQ(ListCalibrationTypes(dir.File("absent.xml").c_str()), nullptr);
+}
+
+// The image's own width decides, not the width the description declares.
+TEST(CalibrationTables, table_shorter_than_the_image_is_not_applied) {
+    rs2test::TempDir dir;
+    rs2gen::ProductOptions options;
+    options.width = 20;
+    const auto product = rs2gen::GenerateProduct(dir.Path(), options);
+    std::string description = rs2test::FileText(product.productXml);
+    const std::string declared = "<numberOfSamplesPerLine>20<";
+    ASSERT_NE(description.find(declared), std::string::npos);
+    description.replace(description.find(declared), declared.size(),
+                        "<numberOfSamplesPerLine>5<");
+    WriteFile(product.productXml, description);
+    std::string gains = "1";
+    for (int i = 1; i < 19; ++i)
+        gains += " 1";
+    WriteFile(dir.File("lutSigma.xml"),
+              "<lut><offset>0</offset><gains>" + gains + "</gains></lut>");
+    host::ClearWarnings();
+    ProductReader reader;
+    std::unique_ptr<ZirOdi2CalibImage> model(
+        LoadProduct(reader, product.productXml.c_str(), "sigma"));
+    ASSERT_NE(model, nullptr);
+    EXPECT_STREQ(model->GetCalibrationType(), "None");
+    EXPECT_EQ(model->CalibrationTable().Size(), 0u);
+    EXPECT_EQ(host::Warnings(),
+              std::vector<std::string>{
+                  "The LUT file " + dir.File("lutSigma.xml") +
+                  " has 19 gains for 20 columns.\n"
+                  "The image will be loaded without calibration"});
 }
 
 } // namespace
