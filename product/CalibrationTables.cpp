@@ -36,7 +36,6 @@
 
 namespace {
 
-using host::HostList;
 using host::HostText;
 
 constexpr char kLookupTableTag[] = "lookupTable";
@@ -211,14 +210,21 @@ LookupTableAttributes(const xercesc::DOMDocument *document) {
     return values;
 }
 
-// The list of calibration types, each entry ":Calibration Type:" + kind.
+// The list of calibration types, each entry ":Calibration Type:" + kind,
+// handed to the host in one call: adding entries one by one would search
+// and grow the whole list for each of a product's many lookupTable
+// elements.
 char **CalibrationTypeList(const std::vector<std::string> &kinds) {
-    HostList list;
-    for (const std::string &kind : kinds) {
-        const std::string entry = kCalibrationTypePrefix + kind;
-        list.reset(AddStringToList(list.release(), entry.c_str()));
-    }
-    return list.release();
+    std::vector<std::string> entries;
+    entries.reserve(kinds.size());
+    for (const std::string &kind : kinds)
+        entries.push_back(kCalibrationTypePrefix + kind);
+    std::vector<char *> texts;
+    texts.reserve(entries.size() + 1);
+    for (std::string &entry : entries)
+        texts.push_back(entry.data());
+    texts.push_back(nullptr);
+    return AddStringList(nullptr, texts.data());
 }
 
 } // namespace

@@ -13,9 +13,28 @@ namespace {
 constexpr const char *kSeparator = ": ";
 
 // A key holding ": " can match entries whose text before their first ": "
-// is only part of the key; such keys are looked up the host's way.
+// is only part of the key; such keys are looked up by every ": " of the
+// entries.
 bool IsIndexable(const char *key) {
     return std::strstr(key, kSeparator) == nullptr;
+}
+
+// FNV-1a, extended one byte at a time, so that the texts before every ": "
+// of an entry are hashed in one pass over it.
+constexpr std::uint64_t kHashStart = 14695981039346656037ull;
+std::uint64_t HashStep(std::uint64_t hash, char c) {
+    return (hash ^ static_cast<unsigned char>(c)) * 1099511628211ull;
+}
+std::uint64_t HashOf(const std::string &text) {
+    std::uint64_t hash = kHashStart;
+    for (char c : text)
+        hash = HashStep(hash, c);
+    return hash;
+}
+
+bool BeginsWithKey(const char *text, const std::string &key) {
+    return std::strncmp(text, key.c_str(), key.size()) == 0 &&
+           std::strncmp(text + key.size(), kSeparator, 2) == 0;
 }
 
 HostText CopyOf(const char *text) {
@@ -45,8 +64,8 @@ char **StringListKeeper::Release() {
 }
 
 const char *StringListKeeper::Fetch(const char *key) const {
-    if (key == nullptr || !IsIndexable(key))
-        return FetchAuxEntry(list, key);
+    if (key == nullptr)
+        return nullptr;
     const auto at = FirstEntry(key);
     return at ? list[*at] + std::strlen(key) + std::strlen(kSeparator)
               : nullptr;
@@ -55,21 +74,11 @@ const char *StringListKeeper::Fetch(const char *key) const {
 void StringListKeeper::Set(const char *key, const char *value) {
     if (key == nullptr)
         return;
-    if (!IsIndexable(key)) {
-        const std::size_t before = count;
-        list = SetAuxEntry(list, key, value);
-        Recount();
-        // An appending host call leaves an array of exactly the texts.
-        if (count != before)
-            capacity = count + 1;
-        return;
-    }
     // Copied before anything is freed: value may point into the entry that
     // is replaced.
     HostText entry = CopyOf(MakeAuxEntry(key, value));
     if (const auto at = FirstEntry(key)) {
-        std::free(list[*at]);
-        list[*at] = entry.release();
+        Replace(*at, std::move(entry));
         return;
     }
     MakeRoom(1);
@@ -98,11 +107,26 @@ void StringListKeeper::Append(char *const *other) {
 
 std::optional<std::size_t>
 StringListKeeper::FirstEntry(const std::string &key) const {
+    if (!IsIndexable(key.c_str()))
+        return FirstPrefixed(key);
     IndexNewEntries();
     const auto found = firstEntries.find(key);
     if (found == firstEntries.end())
         return std::nullopt;
     return found->second;
+}
+
+std::optional<std::size_t>
+StringListKeeper::FirstPrefixed(const std::string &key) const {
+    IndexNewPrefixes();
+    const auto found = prefixEntries.find(HashOf(key));
+    if (found == prefixEntries.end())
+        return std::nullopt;
+    // Texts that only share the key's hash are passed over.
+    for (const std::size_t entry : found->second)
+        if (BeginsWithKey(list[entry], key))
+            return entry;
+    return std::nullopt;
 }
 
 void StringListKeeper::IndexNewEntries() const {
@@ -114,9 +138,53 @@ void StringListKeeper::IndexNewEntries() const {
     }
 }
 
+// Nothing is indexed this way until a key holding ": " is first asked for.
+void StringListKeeper::IndexNewPrefixes() const {
+    for (; prefixIndexed < count; ++prefixIndexed)
+        IndexPrefixes(prefixIndexed, true);
+}
+
+void StringListKeeper::IndexPrefixes(std::size_t entry, bool add) const {
+    std::uint64_t hash = kHashStart;
+    for (const char *c = list[entry]; *c != '\0'; ++c) {
+        if (c[0] == ':' && c[1] == ' ') {
+            if (add)
+                prefixEntries[hash].insert(entry);
+            else
+                ForgetPrefix(hash, entry);
+        }
+        hash = HashStep(hash, *c);
+    }
+}
+
+void StringListKeeper::ForgetPrefix(std::uint64_t hash,
+                                    std::size_t entry) const {
+    const auto found = prefixEntries.find(hash);
+    if (found == prefixEntries.end())
+        return;
+    found->second.erase(entry);
+    if (found->second.empty())
+        prefixEntries.erase(found);
+}
+
+// The entry's text before its key's ": " stays the same; what follows may
+// hold other ": ", so the second index, where it covers the entry, is
+// brought up to date.
+void StringListKeeper::Replace(std::size_t entry, HostText text) {
+    const bool prefixesIndexed = entry < prefixIndexed;
+    if (prefixesIndexed)
+        IndexPrefixes(entry, false);
+    std::free(list[entry]);
+    list[entry] = text.release();
+    if (prefixesIndexed)
+        IndexPrefixes(entry, true);
+}
+
 void StringListKeeper::ForgetIndex() {
     firstEntries.clear();
     indexed = 0;
+    prefixEntries.clear();
+    prefixIndexed = 0;
 }
 
 void StringListKeeper::Recount() {

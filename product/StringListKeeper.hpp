@@ -4,7 +4,9 @@
 #include "host/StringLists.hpp"
 
 #include <cstddef>
+#include <cstdint>
 #include <optional>
+#include <set>
 #include <string>
 #include <unordered_map>
 
@@ -18,7 +20,9 @@ using host::HostText;
 /// A product's metadata is built entry by entry from documents of any size;
 /// the keeper finds the first entry of a key through an index and grows the
 /// array by doubling, so that building n entries costs O(n), not the O(n^2)
-/// of searching and reallocating the host list on every call.
+/// of searching and reallocating the host list on every call. Keys that hold
+/// ": " themselves (a side file may have them) are found through a second
+/// index, built only once such a key is asked for.
 class StringListKeeper {
   public:
     StringListKeeper() = default;
@@ -44,7 +48,12 @@ class StringListKeeper {
 
   private:
     std::optional<std::size_t> FirstEntry(const std::string &key) const;
+    std::optional<std::size_t> FirstPrefixed(const std::string &key) const;
     void IndexNewEntries() const;
+    void IndexNewPrefixes() const;
+    void IndexPrefixes(std::size_t entry, bool add) const;
+    void ForgetPrefix(std::uint64_t hash, std::size_t entry) const;
+    void Replace(std::size_t entry, HostText text);
     void ForgetIndex();
     void Recount();
     void MakeRoom(std::size_t texts);
@@ -56,4 +65,11 @@ class StringListKeeper {
     // [0, indexed); the rest are indexed when a key is next looked up.
     mutable std::unordered_map<std::string, std::size_t> firstEntries;
     mutable std::size_t indexed = 0;
+    // For the entries [0, prefixIndexed): the text before every ": " of an
+    // entry, by its hash, gives the entries that begin with that text. A key
+    // matches an entry when the entry begins with the key and ": ", so the
+    // entries whose such text hashes like the key are the candidates.
+    mutable std::unordered_map<std::uint64_t, std::set<std::size_t>>
+        prefixEntries;
+    mutable std::size_t prefixIndexed = 0;
 };
