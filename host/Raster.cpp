@@ -15,6 +15,7 @@
 #include <array>
 #include <cstdlib>
 #include <cstring>
+#include <limits>
 #include <memory>
 #include <sys/stat.h>
 
@@ -27,7 +28,8 @@ constexpr int32_t kErrNoDataset = 1;
 constexpr int32_t kErrNoOrbit = 23;
 // A request the host's raster services refuse (their code for it).
 constexpr int32_t kErrBadRequest = 5;
-// Long enough for any line of a product description.
+// Long enough for nearly every line of a product description; a longer line
+// is read again into a larger buffer.
 constexpr int32_t kTextLineSize = 1 << 16;
 // Description buffers of the driver operations hold 80 characters and a zero.
 constexpr size_t kDescriptionSize = 81;
@@ -369,8 +371,26 @@ std::vector<std::string> Raster::TextLines() const {
         TextCursor cursor{};
         table->OpenTextSegment(handle, &cursor, "r", 0);
         std::vector<char> line(kTextLineSize);
-        while (table->ReadTextLine(&cursor, line.data(), kTextLineSize) == 1)
+        for (;;) {
+            const int32_t lineIndex = cursor.lineIndex;
+            const auto size = static_cast<int32_t>(line.size());
+            if (table->ReadTextLine(&cursor, line.data(), size) != 1)
+                break;
+            // A line that fills the buffer may have been cut: the cursor is
+            // set back to it and it is read again into twice the room.
+            const bool mayBeCut =
+                std::strlen(line.data()) == line.size() - 1 &&
+                size <= std::numeric_limits<int32_t>::max() / 2;
+            if (mayBeCut) {
+                cursor.lineIndex = lineIndex;
+                line.resize(line.size() * 2);
+                continue;
+            }
             lines.emplace_back(line.data());
+            // The driver fills the whole buffer for every line.
+            if (line.size() > static_cast<size_t>(kTextLineSize))
+                std::vector<char>(kTextLineSize).swap(line);
+        }
     });
     return lines;
 }

@@ -2,13 +2,16 @@
 #include "host/HostMemory.hpp"
 
 #include "host/TextServices.hpp"
+#include "host/XmlUtil.hpp"
 
 #include <cstdlib>
 #include <cstring>
 #include <fstream>
+#include <iterator>
 #include <memory>
 #include <new>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include <sys/stat.h>
@@ -16,6 +19,7 @@
 namespace {
 
 using host::FreeDeleter;
+using host::HostList;
 
 using OwnedText = std::unique_ptr<char, FreeDeleter>;
 
@@ -47,14 +51,6 @@ char **AppendCopies(char **list, const char *const *texts, int count) {
     return grown;
 }
 
-// A list with no texts that is not null: the answer for a readable empty file.
-char **NewEmptyList() {
-    auto *list = static_cast<char **>(HCalloc(1, sizeof(char *)));
-    if (list == nullptr)
-        throw std::bad_alloc();
-    return list;
-}
-
 // The value of entry when it is an entry of key, otherwise null.
 const char *EntryValue(const char *entry, const char *key) {
     std::size_t keyLength = std::strlen(key);
@@ -79,16 +75,34 @@ bool IsRegularFile(const char *path) {
            S_ISREG(status.st_mode);
 }
 
-// The lines of stream; a '\r' is dropped only where it ends a line that a
+// The lines of text; a '\r' is dropped only where it ends a line that a
 // '\n' terminates, so other bytes (Latin-1 included) pass through unchanged.
-bool ReadLines(std::ifstream &stream, std::vector<std::string> &lines) {
-    std::string line;
-    while (std::getline(stream, line)) {
-        bool newlineTerminated = !stream.eof();
-        if (newlineTerminated && !line.empty() && line.back() == '\r')
-            line.pop_back();
+// Lines may be of any length.
+std::vector<std::string_view> SplitLines(std::string_view text) {
+    std::vector<std::string_view> lines;
+    std::size_t start = 0;
+    while (start < text.size()) {
+        const std::size_t newline = text.find('\n', start);
+        if (newline == std::string_view::npos) {
+            lines.push_back(text.substr(start));
+            break;
+        }
+        std::string_view line = text.substr(start, newline - start);
+        if (!line.empty() && line.back() == '\r')
+            line.remove_suffix(1);
         lines.push_back(line);
+        start = newline + 1;
     }
+    return lines;
+}
+
+// The whole file; false when it cannot be read.
+bool ReadWholeFile(const char *path, std::string &bytes) {
+    std::ifstream stream(path, std::ios::binary);
+    if (!stream)
+        return false;
+    bytes.assign(std::istreambuf_iterator<char>(stream),
+                 std::istreambuf_iterator<char>());
     return !stream.bad();
 }
 
@@ -127,18 +141,27 @@ char **DuplicateStringList(char *const *list) {
 char **TextFileToStringList(const char *path) {
     if (!IsRegularFile(path))
         return nullptr;
-    std::ifstream stream(path, std::ios::binary);
-    if (!stream)
+    std::string bytes;
+    if (!ReadWholeFile(path, bytes))
         return nullptr;
-    std::vector<std::string> lines;
-    if (!ReadLines(stream, lines))
-        return nullptr;
-    std::vector<const char *> texts;
-    texts.reserve(lines.size());
-    for (const std::string &line : lines)
-        texts.push_back(line.c_str());
-    return AppendCopies(NewEmptyList(), texts.data(),
-                        static_cast<int>(texts.size()));
+    const std::string text = TextAsUtf8(std::move(bytes));
+    const std::vector<std::string_view> lines = SplitLines(text);
+    // Zeroed slots keep the list terminated while it fills; a readable
+    // empty file gives a list with no texts that is not null.
+    HostList list(
+        static_cast<char **>(HCalloc(lines.size() + 1, sizeof(char *))));
+    if (!list)
+        throw std::bad_alloc();
+    std::size_t count = 0;
+    for (std::string_view line : lines) {
+        char *copy = static_cast<char *>(HMalloc(line.size() + 1));
+        if (copy == nullptr)
+            throw std::bad_alloc();
+        std::memcpy(copy, line.data(), line.size());
+        copy[line.size()] = '\0';
+        list.get()[count++] = copy;
+    }
+    return list.release();
 }
 
 const char *MakeAuxEntry(const char *key, const char *value) {

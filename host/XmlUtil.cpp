@@ -133,7 +133,93 @@ std::string Utf16ToUtf8(const std::basic_string<XMLCh> &wide) {
     return narrow;
 }
 
+enum class WideForm { None, Utf16, Utf32 };
+
+struct WideEncoding {
+    WideForm form = WideForm::None;
+    bool bigEndian = false;
+    std::size_t markBytes = 0; // length of the byte-order mark
+};
+
+bool StartsWith(const std::string &bytes, const char *prefix,
+                std::size_t length) {
+    return bytes.size() >= length &&
+           bytes.compare(0, length, prefix, length) == 0;
+}
+
+// The byte-order marks, then what an XML document without one starts with
+// ('<' of its declaration or root, in every wide form). The UTF-32
+// little-endian mark begins with the UTF-16 one, so it is tried first.
+WideEncoding DetectWideEncoding(const std::string &bytes) {
+    struct Signature {
+        const char *bytes;
+        std::size_t length;
+        WideEncoding encoding;
+    };
+    static const Signature kSignatures[] = {
+        {"\xFF\xFE\0\0", 4, {WideForm::Utf32, false, 4}},
+        {"\0\0\xFE\xFF", 4, {WideForm::Utf32, true, 4}},
+        {"\xFF\xFE", 2, {WideForm::Utf16, false, 2}},
+        {"\xFE\xFF", 2, {WideForm::Utf16, true, 2}},
+        {"<\0\0\0", 4, {WideForm::Utf32, false, 0}},
+        {"\0\0\0<", 4, {WideForm::Utf32, true, 0}},
+        {"<\0", 2, {WideForm::Utf16, false, 0}},
+        {"\0<", 2, {WideForm::Utf16, true, 0}},
+    };
+    for (const Signature &signature : kSignatures)
+        if (StartsWith(bytes, signature.bytes, signature.length))
+            return signature.encoding;
+    return {};
+}
+
+// The code unit of width bytes at pos.
+char32_t CodeUnit(const std::string &bytes, std::size_t pos, std::size_t width,
+                  bool bigEndian) {
+    char32_t unit = 0;
+    for (std::size_t i = 0; i < width; ++i) {
+        const auto byte = static_cast<unsigned char>(
+            bytes[pos + (bigEndian ? i : width - 1 - i)]);
+        unit = (unit << 8) | byte;
+    }
+    return unit;
+}
+
+std::string WideToUtf8(const std::string &bytes, const WideEncoding &encoding) {
+    const std::size_t width = encoding.form == WideForm::Utf32 ? 4 : 2;
+    std::string narrow;
+    narrow.reserve(bytes.size() / width);
+    if (encoding.form == WideForm::Utf16) {
+        std::basic_string<XMLCh> units;
+        units.reserve(bytes.size() / 2);
+        for (std::size_t pos = encoding.markBytes; pos + 2 <= bytes.size();
+             pos += 2)
+            units.push_back(static_cast<XMLCh>(
+                CodeUnit(bytes, pos, 2, encoding.bigEndian)));
+        narrow = Utf16ToUtf8(units);
+    } else {
+        for (std::size_t pos = encoding.markBytes; pos + 4 <= bytes.size();
+             pos += 4) {
+            const char32_t codePoint =
+                CodeUnit(bytes, pos, 4, encoding.bigEndian);
+            AppendUtf8(narrow, codePoint > 0x10FFFF || IsSurrogate(codePoint)
+                                   ? kReplacementCharacter
+                                   : codePoint);
+        }
+    }
+    // A last unit cut short.
+    if ((bytes.size() - encoding.markBytes) % width != 0)
+        AppendUtf8(narrow, kReplacementCharacter);
+    return narrow;
+}
+
 } // namespace
+
+std::string TextAsUtf8(std::string bytes) {
+    const WideEncoding encoding = DetectWideEncoding(bytes);
+    if (encoding.form == WideForm::None)
+        return bytes;
+    return WideToUtf8(bytes, encoding);
+}
 
 int ORV_XMLUtil::Initialize() {
     PlatformCounter &counter = ThePlatformCounter();

@@ -57,3 +57,9 @@ class VXB_API XmlTranscode {
     std::basic_string<XMLCh> wide;
     std::string narrow;
 };
+
+/// The text of a file in UTF-8. Text in UTF-16 or UTF-32, as a byte-order
+/// mark or the first character of an XML document ('<') tells, is
+/// transcoded, without its byte-order mark; malformed units become U+FFFD.
+/// Any other text is returned as it is, byte for byte.
+VXB_API std::string TextAsUtf8(std::string bytes);

@@ -168,6 +168,26 @@ TEST(StringLists, text_file_lines_lose_only_their_terminators) {
         {"CR not before LF", "a\rb\nc\r", {"a\rb", "c\r"}},
         {"Latin-1 byte", "caf\xE9\n", {"caf\xE9"}},
         {"empty file", "", {}},
+        {"a line of any length",
+         std::string(200000, 'x') + "\ny",
+         {std::string(200000, 'x'), "y"}},
+        // Wide text, told by its byte-order mark or by its first '<'.
+        {"UTF-16LE with mark",
+         std::string("\xFF\xFE<\0a\0\r\0\n\0\xE9\0", 12),
+         {"<a", "\xC3\xA9"}},
+        {"UTF-16BE without mark",
+         std::string("\0<\0?\0\n\xD8\x3D\xDE\x00", 10),
+         {"<?", "\xF0\x9F\x98\x80"}},
+        {"UTF-16 cut inside a pair",
+         std::string("\xFE\xFF\0<\xD8\x3D", 6),
+         {"<\xEF\xBF\xBD"}},
+        {"UTF-32LE with mark",
+         std::string("\xFF\xFE\0\0<\0\0\0\n\0\0\0\xE9\0\0\0", 16),
+         {"<", "\xC3\xA9"}},
+        {"UTF-32BE without mark",
+         std::string("\0\0\0<\0\x11\0\0\0\0\0b", 12),
+         {"<\xEF\xBF\xBD"
+          "b"}},
     };
     for (const Case &c : cases) {
         std::string path = dir.File("lines.txt");
