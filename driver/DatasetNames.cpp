@@ -1,5 +1,6 @@
 #include "driver/DatasetNames.hpp"
 
+#include "host/ErrorReports.hpp"
 #include "host/Exception.hpp"
 #include "host/TextServices.hpp"
 #include "host/fileio/DataSourceFactory.hpp"
@@ -25,6 +26,48 @@ std::string LowerCase(std::string text) {
     std::transform(text.begin(), text.end(), text.begin(),
                    [](unsigned char c) { return std::tolower(c); });
     return text;
+}
+
+// A key other than "c" selects nothing; it is most likely a mistyped
+// calibration choice, which would otherwise pass unnoticed.
+void WarnOfUnknownKeys(const URI &uri, const std::string &name) {
+    for (const QueryComponents::Pair &pair : uri.GetQueryComponents().Pairs())
+        if (pair.first != kCalibrationKey)
+            IMPError(-1, host::kWarning,
+                     "The dataset name %s holds the unknown key \"%s\", "
+                     "which is ignored; the only key known is \"%s\" (the "
+                     "calibration: sigma, beta, gamma or none)",
+                     name.c_str(), pair.first.c_str(), kCalibrationKey);
+}
+
+bool IsHexDigit(char c) {
+    return std::isxdigit(static_cast<unsigned char>(c)) != 0;
+}
+
+// Whether some '%' of text does not begin a percent escape.
+bool HasBadPercentEscape(const std::string &text) {
+    for (std::size_t i = text.find('%'); i != std::string::npos;
+         i = text.find('%', i + 1))
+        if (i + 2 >= text.size() || !IsHexDigit(text[i + 1]) ||
+            !IsHexDigit(text[i + 2]))
+            return true;
+    return false;
+}
+
+// The data source of a dataset name. A name that reads as a URI but holds a
+// '%' that begins no escape is refused with a message that says so.
+std::unique_ptr<DataSource> DataSourceOf(const std::string &name) {
+    try {
+        return DataSourceFactory::GetInstance()->Create(name);
+    } catch (const orv::Exception &) {
+        if (!HasBadPercentEscape(name))
+            throw;
+        throw orv::Exception("Invalid dataset name \"" + name +
+                                 "\": a \"%\" must begin an escape of two "
+                                 "hexadecimal digits (\"%25\" for a percent "
+                                 "sign itself)",
+                             "", "", 0);
+    }
 }
 
 std::string NormalizeUriName(const URI &uri) {
@@ -71,12 +114,12 @@ std::string NormalizeCalibrationName(const std::string &text) {
 
 char *NormalizeDatasetName(const char *name) {
     std::string text = name ? name : "";
-    std::unique_ptr<DataSource> source =
-        DataSourceFactory::GetInstance()->Create(text);
+    std::unique_ptr<DataSource> source = DataSourceOf(text);
     std::string normalized;
-    if (auto *uri = dynamic_cast<URI *>(source.get()))
+    if (auto *uri = dynamic_cast<URI *>(source.get())) {
+        WarnOfUnknownKeys(*uri, text);
         normalized = NormalizeUriName(*uri);
-    else
+    } else
         normalized = NormalizeFileName(static_cast<File &>(*source), text);
     return HString(normalized.c_str());
 }

@@ -15,6 +15,8 @@
 #include <filesystem>
 #include <fstream>
 #include <memory>
+#include <string>
+#include <vector>
 
 namespace {
 
@@ -100,6 +102,46 @@ TEST(DatasetNames, parse_file_name_accepts_files_and_local_uris_only) {
         EXPECT_STREQ(error.what(), "Could not parse filename "
                                    "\"http://example.invalid/product.xml\"");
     }
+}
+
+TEST(DatasetNames, unknown_keys_are_warned_about_by_name) {
+    const std::pair<std::string, std::vector<std::string>> cases[] = {
+        {"dir/product.xml?c=sigma", {}},
+        {"dir/product.xml?calibration=sigma", {"calibration"}},
+        {"dir/product.xml?foo=1&c=beta&C=gamma", {"foo", "C"}},
+        {"dir/product.xml:Calibration Type:Gamma", {}},
+    };
+    for (const auto &[name, keys] : cases) {
+        host::ClearWarnings();
+        Normalized(name);
+        std::vector<std::string> expected;
+        for (const std::string &key : keys)
+            expected.push_back("The dataset name " + name +
+                               " holds the unknown key \"" + key +
+                               "\", which is ignored; the only key known is "
+                               "\"c\" (the calibration: sigma, beta, gamma "
+                               "or none)");
+        EXPECT_EQ(host::Warnings(), expected) << name;
+    }
+}
+
+TEST(DatasetNames, a_percent_that_begins_no_escape_is_refused_clearly) {
+    for (const std::string name :
+         {"dir/product.xml?c=%", "dir/product.xml?c=%4",
+          "dir/product.xml?c=%zz", "file:///dir/product%/product.xml"}) {
+        try {
+            Normalized(name);
+            ADD_FAILURE() << name << " was accepted";
+        } catch (const orv::Exception &error) {
+            EXPECT_EQ(std::string(error.what()),
+                      "Invalid dataset name \"" + name +
+                          "\": a \"%\" must begin an escape of two "
+                          "hexadecimal digits (\"%25\" for a percent sign "
+                          "itself)");
+        }
+    }
+    // In a plain file name a '%' is only a letter.
+    EXPECT_EQ(Normalized("dir%/product.xml"), "dir%/product.xml");
 }
 
 TEST_F(GeneratedProduct, open_declares_type_codes_by_calibration_and_family) {
