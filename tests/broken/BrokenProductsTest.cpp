@@ -13,11 +13,13 @@
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 
+#include <algorithm>
 #include <cstdint>
 #include <filesystem>
 #include <fstream>
 #include <map>
 #include <set>
+#include <sstream>
 #include <string>
 #include <vector>
 
@@ -184,6 +186,99 @@ TEST(BrokenProducts, a_grid_of_100000_tie_points_is_read_and_thinned) {
     EXPECT_EQ(info["gcps"]["points"].size(),
               static_cast<size_t>(kMaxGcpSegmentPoints));
     EXPECT_EQ(info["projection"]["geosys"], "UTM 10 U D000");
+}
+
+// The lines `rs2 text` prints for the product in folder.
+std::vector<std::string> TextLines(const std::string &folder) {
+    const CommandResult run = RunRs2("text " + Quoted(folder));
+    EXPECT_EQ(run.exitCode, 0) << run.errors;
+    std::vector<std::string> lines;
+    std::istringstream output(run.output);
+    for (std::string line; std::getline(output, line);)
+        lines.push_back(line);
+    return lines;
+}
+
+TEST(BrokenProducts, descriptions_of_one_long_line_or_wide_text_are_text) {
+    rs2test::TempDir root;
+    const std::string oneLine = root.Path() + "/long";
+    rs2gen::GenerateProduct(oneLine, rs2test::CaseOptions());
+    std::string text = rs2test::FileText(oneLine + "/product.xml");
+    std::replace(text.begin(), text.end(), '\n', ' ');
+    text.insert(text.find("<product"), std::string(70000, ' '));
+    rs2test::WriteFile(oneLine + "/product.xml", text);
+    EXPECT_EQ(TextLines(oneLine), std::vector<std::string>{text});
+    rs2test::TempDir out;
+    const CommandResult denoised =
+        RunRs2("export " + Quoted(oneLine) + " " + Quoted(out.File("d.tif")) +
+               " --calibration sigma --denoise");
+    EXPECT_EQ(denoised.exitCode, 0) << denoised.errors;
+
+    for (const char *wide : {"utf16-description", "utf32-description"}) {
+        const std::vector<std::string> lines =
+            TextLines(rs2test::PrepareCase(kCatalogue, wide, root.Path()));
+        ASSERT_FALSE(lines.empty()) << wide;
+        EXPECT_EQ(lines.front().rfind("<?xml version=\"1.0\"", 0), 0u) << wide;
+        EXPECT_NE(std::find_if(lines.begin(), lines.end(),
+                               [](const std::string &line) {
+                                   return line.find("<productType>SGF<") !=
+                                          std::string::npos;
+                               }),
+                  lines.end())
+            << wide;
+    }
+}
+
+TEST(BrokenProducts, a_folder_named_by_bytes_that_are_not_utf8_opens) {
+    rs2test::TempDir root;
+    const std::string folder = rs2test::PrepareCase(
+        kCatalogue, "names-with-spaces", root.Path() + "/caf\xE9 \xFF");
+    const CommandResult run = RunRs2("info " + Calibrated(folder));
+    EXPECT_EQ(run.exitCode, 0) << run.errors;
+    EXPECT_NE(run.output.find("Sigma0"), std::string::npos) << run.output;
+    const CommandResult json = RunRs2("info --json " + Calibrated(folder));
+    ASSERT_EQ(json.exitCode, 0) << json.errors;
+    // The canonical name is a URI, which writes those bytes escaped.
+    const std::string name = nlohmann::json::parse(json.output)["name"];
+    EXPECT_NE(name.find("caf%E9%20%FF/names-with-spaces/product.xml?c=sigma"),
+              std::string::npos)
+        << name;
+}
+
+// Inputs far larger than the catalogue's own: each must still load, and
+// give what its small form gives.
+TEST(BrokenProducts, many_colon_keys_and_many_lookup_tables_load) {
+    rs2test::TempDir root;
+    const std::string colons = rs2test::PrepareCase(
+        kCatalogue, "side-file-keys-with-colons", root.Path());
+    std::string side;
+    for (int i = 0; i < 160000; ++i)
+        side += "key: " + std::to_string(i) + " = value: " + std::to_string(i) +
+                ";\n";
+    rs2test::WriteFile(colons + "/ProductDescription.self", side);
+    const CommandResult withColons = RunRs2("info --json " + Quoted(colons));
+    ASSERT_EQ(withColons.exitCode, 0) << withColons.errors;
+    const nlohmann::json metadata =
+        nlohmann::json::parse(withColons.output)["metadata"];
+    EXPECT_NE(std::find(metadata.begin(), metadata.end(),
+                        nlohmann::json({"key", "159999: value: 159999"})),
+              metadata.end());
+
+    const std::string tables =
+        rs2test::PrepareCase(kCatalogue, "many-lookup-tables", root.Path());
+    std::string names;
+    for (int i = 0; i < 100000; ++i)
+        names += "<lookupTable k=\"Noise " + std::to_string(i) +
+                 "\">n.xml</lookupTable>";
+    std::string description = rs2test::FileText(tables + "/product.xml");
+    description.insert(description.find("<lookupTable"), names);
+    rs2test::WriteFile(tables + "/product.xml", description);
+    const CommandResult withTables =
+        RunRs2("info --json " + Calibrated(tables));
+    ASSERT_EQ(withTables.exitCode, 0) << withTables.errors;
+    const nlohmann::json info = nlohmann::json::parse(withTables.output);
+    EXPECT_EQ(info["calibration_types"].size(), 100000u + 300u + 4u);
+    EXPECT_EQ(info["calibration_types"][0], ":Calibration Type:Sigma Nought");
 }
 
 } // namespace
