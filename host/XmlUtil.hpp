@@ -62,4 +62,4 @@ class VXB_API XmlTranscode {
 /// mark or the first character of an XML document ('<') tells, is
 /// transcoded, without its byte-order mark; malformed units become U+FFFD.
 /// Any other text is returned as it is, byte for byte.
-VXB_API std::string TextAsUtf8(std::string bytes);
+std::string TextAsUtf8(std::string bytes);
