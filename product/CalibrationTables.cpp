@@ -63,7 +63,7 @@ constexpr char kLookupTableTooShort[] =
 // The largest table file read. A real one holds about 200 KB for 18,000
 // columns; the limit leaves room for tables of a few million gains while the
 // parse of the largest accepted file stays well under a GiB.
-constexpr std::size_t kMaxLookupTableBytes = 48u << 20;
+constexpr std::size_t kMaxLookupTableBytes = 64u << 20;
 
 // The path of the table file whose lookupTable attribute contains pattern,
 // joined to the product directory (which ends in its separator), as a host
