@@ -6,6 +6,7 @@
 #include "product/CalibrationTables.hpp"
 
 #include "host/HostMemory.hpp"
+#include "model/ProductFolder.hpp"
 #include "product/BoundedFileRead.hpp"
 #include "product/DescriptionFacts.hpp"
 
@@ -77,7 +78,8 @@ char *LookupTablePath(const xercesc::DOMDocument *document,
     HostText fileName(FindTextByAttribute(document, kLookupTableTag,
                                           AttributeMatch::ContainsIgnoringCase,
                                           pattern, matchedValue));
-    if (!fileName || !files.Admits(fileName.get()))
+    if (!fileName ||
+        !files.Admits(model->GetProductDirectory(), fileName.get()))
         return nullptr;
     // Without a product directory the file name is taken as it stands.
     const char *directory = model->GetProductDirectory();
@@ -276,15 +278,23 @@ std::unique_ptr<LookupTable> ReadLookupTableFile(const char *path) {
         [path] { return ParseLookupTableFile(path); });
 }
 
-bool LookupTableFiles::Admits(const char *name) {
-    if (IsNameInsideProduct(name))
+bool LookupTableFiles::Admits(const char *directory, const char *name) {
+    const bool namedInside = IsNameInsideProduct(name);
+    const ProductFile file =
+        namedInside ? ResolveProductFile(directory, name) : ProductFile{};
+    if (namedInside && (file.place == ProductFilePlace::Inside ||
+                        file.place == ProductFilePlace::Missing))
         return true;
     const std::string refused = name;
-    if (std::find(refusedNames.begin(), refusedNames.end(), refused) ==
-        refusedNames.end()) {
+    if (std::find(refusedNames.begin(), refusedNames.end(), refused) !=
+        refusedNames.end())
+        return false;
+    refusedNames.push_back(refused);
+    if (namedInside)
+        IMPError(-1, host::kWarning, "%s",
+                 UnreadableProductFileText(file).c_str());
+    else
         WarnNameOutsideProduct(name);
-        refusedNames.push_back(refused);
-    }
     return false;
 }
 

@@ -20,11 +20,13 @@ class LookupTableFiles {
     /// on the first request for that path; null for a null path and for a
     /// file that yields no table.
     const LookupTable *Read(const char *path);
-    /// Whether a table file name of product.xml may be read: a name that
-    /// leads out of the product folder is refused, with a warning naming it
-    /// the first time this load meets it (the calibration and the incidence
-    /// angles may both ask for it).
-    bool Admits(const char *name);
+    /// Whether a table file name of product.xml may be read from the
+    /// product folder directory: a name that leads out of the folder, by
+    /// itself or through a symbolic link, or names no regular file, is
+    /// refused, with a warning naming it the first time this load meets it
+    /// (the calibration and the incidence angles may both ask for it). A
+    /// missing file is admitted, for the loading to report as missing.
+    bool Admits(const char *directory, const char *name);
 
   private:
     std::vector<std::pair<std::string, std::unique_ptr<LookupTable>>> tables;

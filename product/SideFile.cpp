@@ -3,6 +3,7 @@
 #include "host/ErrorReports.hpp"
 #include "host/StringLists.hpp"
 #include "host/fileio/File.hpp"
+#include "model/ProductFolder.hpp"
 #include "product/BoundedFileRead.hpp"
 #include "product/DocumentAccess.hpp"
 #include "product/ProductReader.hpp"
@@ -17,15 +18,14 @@ namespace {
 
 using orv::core::fileio::File;
 
-// Path of ProductDescription.self beside the product description; empty when
-// the product path gives no file name.
-std::string SideFilePath(const char *productPath) {
+// ProductDescription.self in the folder of the product description, which a
+// link must not lead out of: its key = value lines would become metadata.
+ProductFile SideFileOf(const char *productPath) {
     std::unique_ptr<File> product = File::Create(productPath);
     if (!product)
-        return std::string();
-    std::unique_ptr<File> renamed = product->SetBasename("ProductDescription");
-    std::unique_ptr<File> sideFile = renamed->SetExtension("self");
-    return sideFile->GetFileName();
+        return ProductFile{};
+    return ResolveProductFile(product->GetPath().c_str(),
+                              "ProductDescription.self");
 }
 
 // The largest side file read. A real one holds a few KB of key = value
@@ -99,11 +99,16 @@ class SideFileParser {
 char **ReadSideFile(const ProductReader &reader) {
     if (reader.productPath == nullptr)
         return nullptr;
-    std::string path = SideFilePath(reader.productPath);
-    if (path.empty() || DKCheck(path.c_str()) == 0)
+    const ProductFile sideFile = SideFileOf(reader.productPath);
+    if (sideFile.place == ProductFilePlace::Missing)
         return nullptr;
+    if (sideFile.place != ProductFilePlace::Inside) {
+        IMPError(-1, host::kWarning, "%s",
+                 UnreadableProductFileText(sideFile).c_str());
+        return nullptr;
+    }
     SideFileParser parser;
-    for (std::string &line : SplitTokens(ReadWholeFile(path), "\n")) {
+    for (std::string &line : SplitTokens(ReadWholeFile(sideFile.path), "\n")) {
         if (!line.empty())
             parser.ParseLine(std::move(line));
     }
