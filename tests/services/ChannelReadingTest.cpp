@@ -96,6 +96,10 @@ TEST(ChannelReading, detected_real_reads_give_each_listed_channel_its_image) {
         // The host halves the window, and each column keeps its own gain.
         {"resampled", Options("SGF", {"HH", "HV"}, 24, 16),
          "Sigma Nought", {0, 0, 24, 16, 12, 8}, {2}, {1}},
+        // HH and VH: channel 1 shows VV, which has no image, so VH's image
+        // gives the dataset its size and stays readable.
+        {"first channel without image", Options("SGF", {"HH", "VH"}, 24, 16),
+         nullptr, {2, 3, 20, 12, 20, 12}, {2}, {1}},
     };
     // clang-format on
     for (const Case &c : cases) {
