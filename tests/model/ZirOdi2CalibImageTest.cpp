@@ -212,20 +212,20 @@ TEST_F(ImageFiles, serves_only_image_files_of_the_product_it_can_hold) {
     fs::create_symlink(folder / image, folder / "in.tif");
     fs::create_directory(folder / "folder.tif");
     ASSERT_EQ(::mkfifo((folder / "pipe.tif").c_str(), 0600), 0);
-    rs2test::TiffShape wide;
-    wide.width = 4;
-    wide.height = 3;
-    wide.bitsPerSample = 64;
-    wide.sampleFormat = SAMPLEFORMAT_COMPLEXINT;
-    rs2test::WriteTiff((folder / "cint32.tif").string(), wide,
-                       [](uint32_t, uint32_t, uint32_t) { return 70000.0; });
-    rs2test::TiffShape real;
-    real.width = 4;
-    real.height = 3;
-    real.bitsPerSample = 32;
-    real.sampleFormat = SAMPLEFORMAT_IEEEFP;
-    rs2test::WriteTiff((folder / "float.tif").string(), real,
-                       [](uint32_t, uint32_t, uint32_t) { return 0.5; });
+    // 4 x 3 images of one sample layout, every element at value.
+    const auto writeImage = [&](const char *name, uint16_t bits,
+                                uint16_t format, double value) {
+        rs2test::TiffShape shape;
+        shape.width = 4;
+        shape.height = 3;
+        shape.bitsPerSample = bits;
+        shape.sampleFormat = format;
+        rs2test::WriteTiff(
+            (folder / name).string(), shape,
+            [value](uint32_t, uint32_t, uint32_t) { return value; });
+    };
+    writeImage("cint32.tif", 64, SAMPLEFORMAT_COMPLEXINT, 70000.0);
+    writeImage("float.tif", 32, SAMPLEFORMAT_IEEEFP, 0.5);
     struct Case {
         std::string name;
         ProductType type;
