@@ -12,3 +12,4 @@ void AddTextCommands(CLI::App &app);
 void AddDriverCommand(CLI::App &app);
 void AddSampleCommand(CLI::App &app);
 void AddQuicklookCommand(CLI::App &app);
+void AddFootprintCommand(CLI::App &app);

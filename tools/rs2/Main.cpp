@@ -10,10 +10,11 @@ int main(int argc, char **argv) {
     CLI::App app{"rs2: inspect, read and export RADARSAT-2 products"};
     app.set_version_flag("--version", std::string("rs2 ") + RS2_VERSION);
     app.require_subcommand(1);
-    app.footer("Run rs2 COMMAND --help for the options and examples of a "
-               "command.\nExamples:\n  rs2 info dir\n  rs2 export dir "
-               "sigma0_db.tif --calibration sigma --denoise --db\n  rs2 "
-               "quicklook dir preview.png");
+    app.footer(
+        "Run rs2 COMMAND --help for the options and examples of a "
+        "command.\nExamples:\n  rs2 info dir\n  rs2 export dir "
+        "sigma0_db.tif --calibration sigma --denoise --db\n  rs2 "
+        "quicklook dir preview.png\n  rs2 footprint dir > scene.geojson");
     AddInfoCommand(app);
     AddReadCommand(app);
     AddExportCommand(app);
@@ -21,6 +22,7 @@ int main(int argc, char **argv) {
     AddDriverCommand(app);
     AddSampleCommand(app);
     AddQuicklookCommand(app);
+    AddFootprintCommand(app);
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError &error) {
