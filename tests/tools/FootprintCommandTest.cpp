@@ -267,6 +267,50 @@ TEST(FootprintCommand, refuses_what_it_cannot_outline) {
     }
 }
 
+TEST(FootprintCommand, cuts_an_outline_across_the_antimeridian_in_two) {
+    rs2test::TempDir folder;
+    rs2gen::ProductOptions options;
+    options.centerLongitude = 180.0; // tie points on both sides of it
+    const std::string xml =
+        rs2gen::GenerateProduct(folder.Path(), options).productXml;
+    const CommandResult json = Footprint(Quoted(xml));
+    ASSERT_EQ(json.exitCode, 0) << json.errors;
+    const nlohmann::json geometry =
+        nlohmann::json::parse(json.output)["geometry"];
+    EXPECT_EQ(geometry["type"], "MultiPolygon");
+    ASSERT_EQ(geometry["coordinates"].size(), 2u);
+    std::vector<Point> points;
+    for (const nlohmann::json &polygon : geometry["coordinates"]) {
+        const std::vector<Point> part =
+            GeoJsonRing({{"geometry", {{"coordinates", polygon}}}});
+        EXPECT_GT(SignedDoubleArea(part), 0.0);
+        EXPECT_DOUBLE_EQ(part.front().longitude, part.back().longitude);
+        EXPECT_DOUBLE_EQ(part.front().latitude, part.back().latitude);
+        points.insert(points.end(), part.begin(), part.end());
+    }
+    const auto [west, east] = std::minmax_element(
+        points.begin(), points.end(), [](const Point &a, const Point &b) {
+            return a.longitude < b.longitude;
+        });
+    EXPECT_EQ(west->longitude, -180.0);
+    EXPECT_EQ(east->longitude, 180.0);
+    // The corners as the outline gives them: east of the antimeridian
+    // counted from -180, to the six decimals of the driver's grid.
+    for (Point corner : GridOf(xml).corners) {
+        if (corner.longitude > 180.0)
+            corner.longitude -= 360.0;
+        const auto atCorner = [&](const Point &p) {
+            return std::abs(p.longitude - corner.longitude) < 1e-6 &&
+                   std::abs(p.latitude - corner.latitude) < 1e-6;
+        };
+        EXPECT_TRUE(std::any_of(points.begin(), points.end(), atCorner))
+            << corner.longitude << " " << corner.latitude;
+    }
+    const CommandResult kml = Footprint(Quoted(xml) + " --format kml");
+    ASSERT_EQ(kml.exitCode, 0) << kml.errors;
+    EXPECT_EQ(XmlDocument(kml.output).Elements("Polygon")->getLength(), 2u);
+}
+
 TEST(FootprintCommand, keeps_any_product_id_well_formed) {
     rs2test::TempDir folder;
     const std::string xml =

@@ -54,28 +54,37 @@ Properties OutlineProperties(const host::Raster &raster) {
             {"pass_direction", value("OrbitDirection")}};
 }
 
-std::vector<GroundPoint> DatasetOutline(const host::Raster &raster) {
+// The outline in one part, or two for a scene across the antimeridian.
+using Outline = std::vector<std::vector<GroundPoint>>;
+
+Outline DatasetOutline(const host::Raster &raster) {
     const std::string grid = MetadataValue(raster, "GeolocationGrid");
     if (grid.empty())
         throw std::runtime_error(
             "the dataset has no geolocation grid to outline");
-    return OuterRing(ParseGeolocationGrid(grid));
+    return OutlineParts(OuterRing(ParseGeolocationGrid(grid)));
 }
 
-std::string GeoJsonText(const std::vector<GroundPoint> &ring,
-                        const Properties &properties) {
-    nlohmann::json coordinates = nlohmann::json::array();
-    for (const GroundPoint &point : ring)
-        coordinates.push_back({point.longitude, point.latitude});
+nlohmann::json GeoJsonGeometry(const Outline &outline) {
+    nlohmann::json polygons = nlohmann::json::array();
+    for (const std::vector<GroundPoint> &ring : outline) {
+        nlohmann::json coordinates = nlohmann::json::array();
+        for (const GroundPoint &point : ring)
+            coordinates.push_back({point.longitude, point.latitude});
+        polygons.push_back(nlohmann::json::array({coordinates}));
+    }
+    if (polygons.size() == 1)
+        return {{"type", "Polygon"}, {"coordinates", polygons[0]}};
+    return {{"type", "MultiPolygon"}, {"coordinates", polygons}};
+}
+
+std::string GeoJsonText(const Outline &outline, const Properties &properties) {
     nlohmann::json members = nlohmann::json::object();
     for (const auto &[key, value] : properties)
         members[key] = value.empty() ? nlohmann::json() : nlohmann::json(value);
-    const nlohmann::json feature = {
-        {"type", "Feature"},
-        {"geometry",
-         {{"type", "Polygon"},
-          {"coordinates", nlohmann::json::array({coordinates})}}},
-        {"properties", members}};
+    const nlohmann::json feature = {{"type", "Feature"},
+                                    {"geometry", GeoJsonGeometry(outline)},
+                                    {"properties", members}};
     return JsonText(feature, 2);
 }
 
@@ -115,8 +124,18 @@ std::string NumberText(double value) {
     return std::string(buffer, result.ptr);
 }
 
-std::string KmlText(const std::vector<GroundPoint> &ring,
-                    const Properties &properties) {
+std::string KmlPolygon(const std::vector<GroundPoint> &ring,
+                       const std::string &indent) {
+    std::string kml = indent + "<Polygon><outerBoundaryIs><LinearRing>\n" +
+                      indent + "  <coordinates>";
+    for (size_t i = 0; i < ring.size(); ++i)
+        kml += (i == 0 ? "" : " ") + NumberText(ring[i].longitude) + "," +
+               NumberText(ring[i].latitude) + ",0";
+    return kml + "</coordinates>\n" + indent +
+           "</LinearRing></outerBoundaryIs></Polygon>\n";
+}
+
+std::string KmlText(const Outline &outline, const Properties &properties) {
     std::string kml = "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n"
                       "<kml xmlns=\"http://www.opengis.net/kml/2.2\">\n"
                       "  <Placemark>\n";
@@ -132,14 +151,15 @@ std::string KmlText(const std::vector<GroundPoint> &ring,
                 "</value></Data>\n";
     }
     kml += "    <ExtendedData>\n" + data + "    </ExtendedData>\n";
-    kml += "    <Polygon>\n      <outerBoundaryIs>\n        <LinearRing>\n"
-           "          <coordinates>";
-    for (size_t i = 0; i < ring.size(); ++i)
-        kml += (i == 0 ? "" : " ") + NumberText(ring[i].longitude) + "," +
-               NumberText(ring[i].latitude) + ",0";
-    kml += "</coordinates>\n        </LinearRing>\n      </outerBoundaryIs>\n"
-           "    </Polygon>\n  </Placemark>\n</kml>\n";
-    return kml;
+    if (outline.size() == 1) {
+        kml += KmlPolygon(outline[0], "    ");
+    } else {
+        kml += "    <MultiGeometry>\n";
+        for (const std::vector<GroundPoint> &ring : outline)
+            kml += KmlPolygon(ring, "      ");
+        kml += "    </MultiGeometry>\n";
+    }
+    return kml + "  </Placemark>\n</kml>\n";
 }
 
 } // namespace
@@ -162,11 +182,11 @@ void AddFootprintCommand(CLI::App &app) {
         "dir/product.xml --format kml > scene.kml");
     command->callback([] {
         host::Raster raster = OpenDataset(options.name);
-        const std::vector<GroundPoint> ring = DatasetOutline(raster);
+        const Outline outline = DatasetOutline(raster);
         const Properties properties = OutlineProperties(raster);
         const std::string text = options.format == "kml"
-                                     ? KmlText(ring, properties)
-                                     : GeoJsonText(ring, properties) + "\n";
+                                     ? KmlText(outline, properties)
+                                     : GeoJsonText(outline, properties) + "\n";
         std::fputs(text.c_str(), stdout);
     });
 }

@@ -33,10 +33,12 @@ std::vector<double> GridNumbers(const std::string &text) {
     return numbers;
 }
 
+// Longitudes may come from -180 to 180 or from 0 to 360; latitudes end at
+// the poles.
 bool OnTheGlobe(const GridTiePoint &point) {
     return std::isfinite(point.line) && std::isfinite(point.pixel) &&
-           std::fabs(point.latitude) <= 90.0 &&
-           std::fabs(point.longitude) <= 180.0;
+           std::fabs(point.longitude) <= 360.0 &&
+           std::fabs(point.latitude) <= 90.0;
 }
 
 // The grid's lines from the first to the last, each left to right.
@@ -87,21 +89,62 @@ std::vector<GroundPoint> RingInImageOrder(const GridLines &lines) {
     return ring;
 }
 
+// The ring with each longitude moved by whole turns to within half a turn
+// of the one before it, the first one into [-180, 180).
+std::vector<GroundPoint> Continuous(std::vector<GroundPoint> ring) {
+    double previous = ring.front().longitude;
+    previous -= 360.0 * std::floor((previous + 180.0) / 360.0);
+    for (GroundPoint &point : ring) {
+        point.longitude -=
+            360.0 * std::round((point.longitude - previous) / 360.0);
+        previous = point.longitude;
+    }
+    return ring;
+}
+
 // Twice the area the closed ring encloses, positive when it runs
-// counter-clockwise. Each longitude is taken on the side of the previous
-// point nearer to it, so that a scene across the antimeridian keeps its
-// true shape.
+// counter-clockwise.
 double SignedDoubleArea(const std::vector<GroundPoint> &ring) {
     double area = 0.0;
-    double previous = ring.front().longitude;
-    for (size_t i = 1; i < ring.size(); ++i) {
-        double longitude = ring[i].longitude;
-        longitude -= 360.0 * std::round((longitude - previous) / 360.0);
-        area +=
-            (previous - longitude) * (ring[i - 1].latitude + ring[i].latitude);
-        previous = longitude;
-    }
+    for (size_t i = 1; i < ring.size(); ++i)
+        area += (ring[i - 1].longitude - ring[i].longitude) *
+                (ring[i - 1].latitude + ring[i].latitude);
     return area;
+}
+
+// The part of a closed ring west (or east) of a meridian, closed, with the
+// points where its edges cross the meridian; edges are straight in
+// longitude and latitude.
+std::vector<GroundPoint> PartBeside(const std::vector<GroundPoint> &ring,
+                                    double meridian, bool west) {
+    const auto inside = [&](const GroundPoint &point) {
+        return west ? point.longitude <= meridian : point.longitude >= meridian;
+    };
+    std::vector<GroundPoint> part;
+    const auto add = [&](const GroundPoint &point) {
+        if (part.empty() || part.back().longitude != point.longitude ||
+            part.back().latitude != point.latitude)
+            part.push_back(point);
+    };
+    for (size_t i = 0; i + 1 < ring.size(); ++i) {
+        const GroundPoint &from = ring[i], &to = ring[i + 1];
+        if (inside(from))
+            add(from);
+        if (inside(from) != inside(to)) {
+            const double t =
+                (meridian - from.longitude) / (to.longitude - from.longitude);
+            add({meridian, from.latitude + t * (to.latitude - from.latitude)});
+        }
+    }
+    add(part.front());
+    return part;
+}
+
+std::vector<GroundPoint> ShiftedBy(std::vector<GroundPoint> ring,
+                                   double degrees) {
+    for (GroundPoint &point : ring)
+        point.longitude += degrees;
+    return ring;
 }
 
 } // namespace
@@ -119,7 +162,13 @@ std::vector<GridTiePoint> ParseGeolocationGrid(const std::string &text) {
 }
 
 std::vector<GroundPoint> OuterRing(const std::vector<GridTiePoint> &points) {
-    std::vector<GroundPoint> ring = RingInImageOrder(LinesOf(points));
+    std::vector<GroundPoint> ring =
+        Continuous(RingInImageOrder(LinesOf(points)));
+    // A border that comes back one turn east or west of where it began has
+    // gone round a pole: no polygon of longitude and latitude holds it.
+    if (ring.back().longitude != ring.front().longitude)
+        throw std::runtime_error("the geolocation grid's border goes round a "
+                                 "pole, which this outline cannot show");
     const double area = SignedDoubleArea(ring);
     if (area == 0.0)
         throw std::runtime_error(
@@ -127,4 +176,25 @@ std::vector<GroundPoint> OuterRing(const std::vector<GridTiePoint> &points) {
     if (area < 0.0)
         std::reverse(ring.begin(), ring.end());
     return ring;
+}
+
+std::vector<std::vector<GroundPoint>>
+OutlineParts(const std::vector<GroundPoint> &ring) {
+    const auto east =
+        std::max_element(ring.begin(), ring.end(),
+                         [](const GroundPoint &a, const GroundPoint &b) {
+                             return a.longitude < b.longitude;
+                         });
+    const auto west =
+        std::min_element(ring.begin(), ring.end(),
+                         [](const GroundPoint &a, const GroundPoint &b) {
+                             return a.longitude < b.longitude;
+                         });
+    if (east->longitude > 180.0)
+        return {PartBeside(ring, 180.0, true),
+                ShiftedBy(PartBeside(ring, 180.0, false), -360.0)};
+    if (west->longitude < -180.0)
+        return {ShiftedBy(PartBeside(ring, -180.0, true), 360.0),
+                PartBeside(ring, -180.0, false)};
+    return {ring};
 }

@@ -19,7 +19,7 @@ struct GridTiePoint {
 };
 
 struct GroundPoint {
-    double longitude = 0.0; // degrees east, within [-180, 180]
+    double longitude = 0.0; // degrees east
     double latitude = 0.0;  // degrees north
 };
 
@@ -32,7 +32,15 @@ std::vector<GridTiePoint> ParseGeolocationGrid(const std::string &text);
 /// to bottom, its last line right to left and its first column bottom to
 /// top, closed, and reversed when that way round is clockwise on the ground.
 /// The grid's lines are the tie points of one line value, in any order.
-/// Throws std::runtime_error when the points enclose no area: fewer than two
-/// lines, a line of fewer than two points, coordinates that are not on the
-/// globe.
+/// Longitudes run on without a jump (179, 181 rather than 179, -179), so the
+/// ring may leave [-180, 180]. Throws std::runtime_error when the points
+/// enclose no area: fewer than two lines, a line of fewer than two points,
+/// coordinates that are not on the globe, a border around a pole.
 std::vector<GroundPoint> OuterRing(const std::vector<GridTiePoint> &points);
+
+/// The outer ring as polygons with longitudes within [-180, 180]: the ring
+/// itself, or, for a scene across the antimeridian, its parts west and east
+/// of it, so that no edge runs the long way round the globe. Each part is
+/// closed and counter-clockwise.
+std::vector<std::vector<GroundPoint>>
+OutlineParts(const std::vector<GroundPoint> &ring);
