@@ -196,7 +196,7 @@ TEST(FootprintCommand, outlines_the_grid_border_in_geojson_and_kml) {
             EXPECT_EQ(points.size(), 2 * (grid.columns + grid.rows) - 3);
         }
 
-        const CommandResult kml = Footprint(Quoted(xml) + " --format kml");
+        const CommandResult kml = Footprint(Quoted(xml) + " --format KML");
         ASSERT_EQ(kml.exitCode, 0) << kml.errors;
         const XmlDocument placemark(kml.output);
         EXPECT_EQ(placemark.Texts("name").at(0), "PDS_00000001");

@@ -171,13 +171,16 @@ void AddFootprintCommand(CLI::App &app) {
     command->add_option("NAME", options.name, "dataset name")->required();
     command
         ->add_option("--format", options.format,
-                     "geojson (default): a Feature with a Polygon; kml: a "
-                     "Placemark")
-        ->check(CLI::IsMember({"geojson", "kml"}, CLI::ignore_case));
+                     "geojson (default): a Feature; kml: a Placemark "
+                     "(either case)")
+        // transform, unlike check, also sets the value to the member's own
+        // text, so that "KML" chooses kml.
+        ->transform(CLI::IsMember({"geojson", "kml"}, CLI::ignore_case));
     command->footer(
         "The outline is the border of the product's geolocation grid, in "
-        "WGS 84 longitude and latitude, counter-clockwise and closed; its "
-        "properties name the product and its first line time (UTC).\n"
+        "WGS 84 longitude and latitude, counter-clockwise and closed, cut in "
+        "two at the antimeridian; its properties name the product and its "
+        "first line time (UTC).\n"
         "Examples:\n  rs2 footprint dir > scene.geojson\n  rs2 footprint "
         "dir/product.xml --format kml > scene.kml");
     command->callback([] {
