@@ -114,7 +114,8 @@ double SignedDoubleArea(const std::vector<GroundPoint> &ring) {
 
 // The part of a closed ring west (or east) of a meridian, closed, with the
 // points where its edges cross the meridian; edges are straight in
-// longitude and latitude.
+// longitude and latitude. A scene's border, close to a quadrilateral,
+// crosses the meridian twice, so each side is one piece.
 std::vector<GroundPoint> PartBeside(const std::vector<GroundPoint> &ring,
                                     double meridian, bool west) {
     const auto inside = [&](const GroundPoint &point) {
@@ -180,16 +181,11 @@ std::vector<GroundPoint> OuterRing(const std::vector<GridTiePoint> &points) {
 
 std::vector<std::vector<GroundPoint>>
 OutlineParts(const std::vector<GroundPoint> &ring) {
-    const auto east =
-        std::max_element(ring.begin(), ring.end(),
-                         [](const GroundPoint &a, const GroundPoint &b) {
-                             return a.longitude < b.longitude;
-                         });
-    const auto west =
-        std::min_element(ring.begin(), ring.end(),
-                         [](const GroundPoint &a, const GroundPoint &b) {
-                             return a.longitude < b.longitude;
-                         });
+    const auto [west, east] =
+        std::minmax_element(ring.begin(), ring.end(),
+                            [](const GroundPoint &a, const GroundPoint &b) {
+                                return a.longitude < b.longitude;
+                            });
     if (east->longitude > 180.0)
         return {PartBeside(ring, 180.0, true),
                 ShiftedBy(PartBeside(ring, 180.0, false), -360.0)};
