@@ -139,6 +139,8 @@ std::string KmlText(const Outline &outline, const Properties &properties) {
     std::string kml = "<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n"
                       "<kml xmlns=\"http://www.opengis.net/kml/2.2\">\n"
                       "  <Placemark>\n";
+    // KML wants the name before the time stamp, and the properties list
+    // the id before the time.
     std::string data;
     for (const auto &[key, value] : properties) {
         if (value.empty())
