@@ -32,9 +32,8 @@ constexpr uint64_t kTagMargin = uint64_t{64} << 20;
 // WGS 84 / UTM zone 1N is 32601, zone 1S is 32701.
 constexpr int kUtmNorthBase = 32600;
 constexpr int kUtmSouthBase = 32700;
-// ModelTiepointTag counts its values in 16 bits, six values a point (one
-// point more is the anchor of a north-up transform).
-constexpr size_t kMaxTiePoints = 65535 / 6 - 1;
+// RPCCoefficientTag, where GeoTIFF readers look for an RPC model.
+constexpr ttag_t kRpcCoefficientTag = 50844;
 // Rows longer than this are refused: a strip holds at least one row.
 constexpr size_t kMaxRowBytes = size_t{1} << 30;
 
@@ -132,6 +131,12 @@ void CheckGeoreferencing(const GeoTiffGeoreferencing &geo) {
     if (!geo.hasTransform && geo.tiePoints.empty())
         throw std::invalid_argument(
             "georeferencing needs a transform or tie points");
+    const auto &rpc = geo.rpcCoefficients;
+    if (!rpc.empty() &&
+        (rpc.size() != kRpcTagValues || !AllFinite(rpc.data(), rpc.size())))
+        throw std::invalid_argument("an RPC model takes " +
+                                    std::to_string(kRpcTagValues) +
+                                    " finite values");
 }
 
 // A north-up transform is said with the pixel scale and one tie point, the
@@ -245,6 +250,25 @@ struct GeoTiffWriter::State {
         }
         if (!set)
             Fail("cannot set the image layout");
+    }
+
+    // libtiff knows no RPC tag: the handle learns it before it is set.
+    void WriteRpcTag(const std::vector<double> &rpc) {
+        if (rpc.empty())
+            return;
+        static const TIFFFieldInfo rpcField = {
+            kRpcCoefficientTag,
+            TIFF_VARIABLE,
+            TIFF_VARIABLE,
+            TIFF_DOUBLE,
+            FIELD_CUSTOM,
+            1,
+            1,
+            const_cast<char *>("RPCCoefficient")};
+        if (TIFFMergeFieldInfo(tiff, &rpcField, 1) != 0 ||
+            TIFFSetField(tiff, kRpcCoefficientTag, static_cast<int>(rpc.size()),
+                         rpc.data()) != 1)
+            Fail("cannot write the RPC tag");
     }
 
     void WriteModelKeys(const ModelSystem &system) {
@@ -368,6 +392,7 @@ void GeoTiffWriter::SetGeoreferencing(const GeoTiffGeoreferencing &geo) {
     const ModelSystem system = ParseModelSystem(geo.geosys);
     CheckGeoreferencing(geo);
     s.WriteModelTags(geo);
+    s.WriteRpcTag(geo.rpcCoefficients);
     s.WriteModelKeys(system);
     s.georeferenced = true;
 }

@@ -16,6 +16,17 @@ namespace host {
 /// Error code of a GeoTIFF that cannot be created or written.
 constexpr int32_t kErrWriteFailed = 6;
 
+/// The most tie points a file takes: ModelTiepointTag counts its values in
+/// 16 bits, six values a point (one point more is the anchor of a north-up
+/// transform).
+constexpr size_t kMaxTiePoints = 65535 / 6 - 1;
+
+/// Values of the GeoTIFF RPC tag: error bias and random error, the line,
+/// sample, latitude, longitude and height offsets, the same five scales,
+/// then the line numerator and denominator and the sample numerator and
+/// denominator, 20 coefficients each.
+constexpr size_t kRpcTagValues = 92;
+
 /// What one channel of a written pixel holds.
 enum class SampleType {
     Float32,        ///< one IEEE float
@@ -42,6 +53,10 @@ struct GeoTiffGeoreferencing {
     /// Ground control points in geosys. Without a transform they are the
     /// georeferencing; with one they travel beside it in the same system.
     std::vector<TiePoint> tiePoints;
+    /// Empty, or the kRpcTagValues values of the GeoTIFF RPC tag
+    /// (RPCCoefficientTag): an RPC model of the image, written beside the
+    /// georeferencing.
+    std::vector<double> rpcCoefficients;
 };
 
 /// A new stripped, uncompressed GeoTIFF written row band by row band, so a
@@ -76,8 +91,8 @@ class VXB_API GeoTiffWriter {
     /// Sets the georeferencing tags and keys, once, before the first row
     /// (else std::logic_error); an empty geosys sets nothing. Throws
     /// std::invalid_argument for an unknown system, a non-finite or singular
-    /// transform, non-finite or too many tie points, or neither transform
-    /// nor tie points.
+    /// transform, non-finite or too many tie points, neither transform nor
+    /// tie points, or RPC values of another count or not finite.
     void SetGeoreferencing(const GeoTiffGeoreferencing &georeferencing);
 
     /// Writes rowCount rows starting at firstRow from data (rowCount x

@@ -268,13 +268,13 @@ TEST(GeoTiffWriter, writes_utm_and_geographic_georeferencing_as_pixel_is_area) {
     // clang-format off
     const Case cases[] = {
         // A rotated grid needs the matrix; its tie points follow it.
-        {{"UTM 10 U D000", true, rotated, {{0.5, 0.5, 500010.0, 5449990.0, 3.0}}},
+        {{"UTM 10 U D000", true, rotated, {{0.5, 0.5, 500010.0, 5449990.0, 3.0}}, {}},
          ModelTypeProjected, 32610, -1, rotatedMatrix, {}, {0.5, 0.5, 0, 500010.0, 5449990.0, 3.0}},
         // A north-up grid in the south: scale and one tie point.
-        {{"UTM 33 H D000", true, northUp, {}},
+        {{"UTM 33 H D000", true, northUp, {}, {}},
          ModelTypeProjected, 32733, -1, {}, {10.0, 10.0, 0.0}, {0, 0, 0, 300000.0, 7000000.0, 0}},
         // Tie points alone, in WGS 84 longitude and latitude.
-        {{"LONG D000", false, {}, {tie}},
+        {{"LONG D000", false, {}, {tie}, {}},
          ModelTypeGeographic, -1, GCS_WGS_84, {}, {}, {0.5, 0.5, 0, -123.25, 49.5, 12.0}},
     };
     // clang-format on
@@ -299,6 +299,7 @@ TEST(GeoTiffWriter, the_host_reader_reads_back_what_it_wrote) {
         "UTM 10 U D000",
         true,
         {500000.0, 11.5, -2.0, 5450000.0, -1.5, -12.5},
+        {},
         {}};
     WriteAndReadBack(path, geo);
     host::Raster raster = host::OpenRaster(path);
@@ -311,12 +312,19 @@ TEST(GeoTiffWriter, the_host_reader_reads_back_what_it_wrote) {
 TEST(GeoTiffWriter, refuses_georeferencing_it_cannot_state) {
     const double nan = std::nan("");
     const host::GeoTiffGeoreferencing cases[] = {
-        {"PIXEL", true, {0, 1, 0, 0, 0, -1}, {}},        // no ground system
-        {"METER", true, {0, 1, 0, 0, 0, -1}, {}},        // no known datum
-        {"UTM 10 U D000", true, {0, 1, 2, 0, 2, 4}, {}}, // singular
-        {"UTM 10 U D000", true, {nan, 1, 0, 0, 0, -1}, {}},
-        {"LONG D000", false, {}, {{0.5, 0.5, nan, 49.0, 0.0}}},
-        {"LONG D000", false, {}, {}}, // nothing to state
+        {"PIXEL", true, {0, 1, 0, 0, 0, -1}, {}, {}},        // no ground system
+        {"METER", true, {0, 1, 0, 0, 0, -1}, {}, {}},        // no known datum
+        {"UTM 10 U D000", true, {0, 1, 2, 0, 2, 4}, {}, {}}, // singular
+        {"UTM 10 U D000", true, {nan, 1, 0, 0, 0, -1}, {}, {}},
+        {"LONG D000", false, {}, {{0.5, 0.5, nan, 49.0, 0.0}}, {}},
+        {"LONG D000", false, {}, {}, {}}, // nothing to state
+        // An RPC model of another size than the tag's, or not finite.
+        {"LONG D000", false, {}, {{0.5, 0.5, -123.0, 49.0, 0.0}}, {1.0, 2.0}},
+        {"LONG D000",
+         false,
+         {},
+         {{0.5, 0.5, -123.0, 49.0, 0.0}},
+         std::vector<double>(host::kRpcTagValues, nan)},
     };
     rs2test::TempDir folder;
     for (const host::GeoTiffGeoreferencing &geo : cases) {

@@ -2,6 +2,7 @@
 
 #include "host/ErrorReports.hpp"
 #include "host/ModelSegments.hpp"
+#include "tools/rs2/TiePointGrid.hpp"
 
 #include <memory>
 
@@ -33,6 +34,21 @@ json ProjectionJson(const host::Raster &raster) {
     return {{"geosys", projection.geosys},
             {"code", DecodeGeosys(projection.geosys, nullptr)},
             {"transform", {t[0], t[1], t[2], t[3], t[4], t[5]}}};
+}
+
+// How far the dataset's affine UTM transform is from its geolocation grid,
+// in metres; null without a UTM transform or a grid to measure it against.
+json AffineMisfitJson(const host::Raster &raster) {
+    const ProjInfo_t projection = raster.Projection();
+    if (DecodeGeosys(projection.geosys, nullptr) != kGeosysUTM)
+        return nullptr;
+    const AffineMisfit misfit =
+        MeasureAffineMisfit(projection, GeolocationGrid(raster));
+    if (misfit.mapDistance.empty())
+        return nullptr;
+    return {{"max_m", misfit.MaxMapDistance()},
+            {"rms_m", misfit.RmsMapDistance()},
+            {"tie_points", misfit.mapDistance.size()}};
 }
 
 json GcpsJson(const host::Raster &raster) {
@@ -139,6 +155,7 @@ json DescribeDataset(const host::Raster &raster) {
     info["channels"] = ChannelsJson(raster);
     info["metadata"] = EntriesJson(raster.Metadata(1));
     info["projection"] = ProjectionJson(raster);
+    info["affine_misfit"] = AffineMisfitJson(raster);
     info["gcps"] = GcpsJson(raster);
     info["segments"] = SegmentsJson(raster);
     info["calibration_types"] = raster.CalibrationTypes();

@@ -1,6 +1,7 @@
 #include "tools/rs2/ExportGeoreferencing.hpp"
 
 #include "host/RasterServices.hpp"
+#include "tools/rs2/TiePointGrid.hpp"
 
 #include <array>
 #include <cmath>
@@ -23,11 +24,17 @@ std::array<double, 6> WindowTransform(const double *t, const ExportPlan &plan) {
 
 // The dataset's ground control points in the file's system, at their
 // positions in the output grid. Points that cannot be carried into that
-// system are left out.
-std::vector<host::TiePoint> OutputTiePoints(const host::GcpSet &gcps,
-                                            const char *groundGeosys,
-                                            const std::string &fileGeosys,
-                                            const ExportPlan &plan) {
+// system are left out, and all of them when the dataset gives them in a
+// system without ground meaning.
+std::vector<host::TiePoint> DatasetTiePoints(const host::Raster &raster,
+                                             const std::string &fileGeosys,
+                                             const ExportPlan &plan) {
+    const host::GcpSet gcps = raster.GroundControlPoints();
+    char groundGeosys[kGeosysTextSize] = {};
+    const int32_t groundCode =
+        DecodeGeosys(gcps.groundGeosys.c_str(), groundGeosys);
+    if (groundCode != kGeosysUTM && groundCode != kGeosysLong)
+        return {};
     const double columnScale = 1.0 / plan.ColumnStep();
     const double lineScale = 1.0 / plan.LineStep();
     const bool sameSystem = fileGeosys == groundGeosys;
@@ -49,34 +56,70 @@ std::vector<host::TiePoint> OutputTiePoints(const host::GcpSet &gcps,
     return ties;
 }
 
+// Whether the transform puts every tie point of the grid within half an
+// output pixel of its place. A slant-range image is evenly spaced in range
+// time, not on the ground, so no affine map may describe it; a map-projected
+// product passes. A grid of which no point reaches the transform's system
+// contradicts nothing.
+bool TransformFitsGrid(const ProjInfo_t &projection,
+                       const std::vector<GridTiePoint> &grid,
+                       const ExportPlan &plan) {
+    const AffineMisfit misfit = MeasureAffineMisfit(projection, grid);
+    for (const auto &[columns, lines] : misfit.pixelOffset) {
+        if (std::hypot(columns / plan.ColumnStep(), lines / plan.LineStep()) >
+            0.5)
+            return false;
+    }
+    return true;
+}
+
+// The grid's points at their positions in the output grid, in WGS 84
+// geographic coordinates. A grid beyond what a file holds is thinned evenly.
+std::vector<host::TiePoint>
+OutputGridPoints(const std::vector<GridTiePoint> &grid,
+                 const ExportPlan &plan) {
+    const size_t step = grid.size() / host::kMaxTiePoints + 1;
+    std::vector<host::TiePoint> ties;
+    for (size_t i = 0; i < grid.size(); i += step) {
+        const GridTiePoint &point = grid[i];
+        ties.push_back({(point.pixel - plan.window.x) / plan.ColumnStep(),
+                        (point.line - plan.window.y) / plan.LineStep(),
+                        point.longitude, point.latitude, point.height});
+    }
+    return ties;
+}
+
+std::string GeographicSystem() {
+    char geographic[kGeosysTextSize] = {};
+    DecodeGeosys("LONG D000", geographic);
+    return geographic;
+}
+
 } // namespace
 
-// A GeoTIFF holds one model system: a UTM or geographic dataset gives its
-// transform, and its ground control points join it in that system; without
-// a map transform the points alone georeference the file, in WGS 84.
+// A GeoTIFF holds one model system. A UTM or geographic dataset whose
+// transform fits its tie points gives that transform, and its ground control
+// points join it in that system. Otherwise the control points alone
+// georeference the file, in WGS 84: every point of the geolocation grid, or
+// the dataset's own points when it states no grid.
 host::GeoTiffGeoreferencing OutputGeoreferencing(const host::Raster &raster,
                                                  const ExportPlan &plan) {
     host::GeoTiffGeoreferencing geo;
     const ProjInfo_t projection = raster.Projection();
+    const std::vector<GridTiePoint> grid = GeolocationGrid(raster);
     char system[kGeosysTextSize] = {};
     const int32_t code = DecodeGeosys(projection.geosys, system);
-    if (code == kGeosysUTM || code == kGeosysLong) {
+    if ((code == kGeosysUTM || code == kGeosysLong) &&
+        TransformFitsGrid(projection, grid, plan)) {
         geo.geosys = system;
         geo.hasTransform = true;
         geo.transform = WindowTransform(projection.transform, plan);
+    } else {
+        geo.geosys = GeographicSystem();
+        geo.tiePoints = OutputGridPoints(grid, plan);
     }
-    const host::GcpSet gcps = raster.GroundControlPoints();
-    char ground[kGeosysTextSize] = {};
-    const int32_t groundCode = DecodeGeosys(gcps.groundGeosys.c_str(), ground);
-    if (gcps.points.empty() ||
-        (groundCode != kGeosysUTM && groundCode != kGeosysLong))
-        return geo;
-    if (geo.geosys.empty()) {
-        char geographic[kGeosysTextSize] = {};
-        DecodeGeosys("LONG D000", geographic);
-        geo.geosys = geographic;
-    }
-    geo.tiePoints = OutputTiePoints(gcps, ground, geo.geosys, plan);
+    if (geo.tiePoints.empty())
+        geo.tiePoints = DatasetTiePoints(raster, geo.geosys, plan);
     if (!geo.hasTransform && geo.tiePoints.empty())
         geo.geosys.clear();
     return geo;

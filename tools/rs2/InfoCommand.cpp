@@ -102,6 +102,19 @@ std::string GeosysWithEpsg(const std::string &geosys) {
     return epsg == 0 ? geosys : geosys + " (EPSG:" + std::to_string(epsg) + ")";
 }
 
+// The affine transform's misfit against the geolocation grid, e.g.
+// "max 4210.3 m, RMS 3012.8 m over 231 tie points".
+std::string MisfitText(const json &misfit) {
+    if (misfit.is_null())
+        return "not measured";
+    char text[160];
+    std::snprintf(text, sizeof text,
+                  "max %.1f m, RMS %.1f m over %zu tie points",
+                  misfit["max_m"].get<double>(), misfit["rms_m"].get<double>(),
+                  misfit["tie_points"].get<size_t>());
+    return text;
+}
+
 void RowsFromEntries(
     const json &info,
     const std::vector<std::pair<const char *, const char *>> &labelsAndKeys) {
@@ -174,6 +187,7 @@ void PrintSummary(const json &info, const std::string &unapplied) {
     Heading("Georeferencing");
     Row("coordinate system", GeosysWithEpsg(info["projection"]["geosys"]));
     Row("ground control points", std::to_string(info["gcps"]["points"].size()));
+    Row("affine misfit", MisfitText(info["affine_misfit"]));
     Row("RPC model", info["rpc"].is_null() ? "none" : "yes");
     Row("orbit state vectors",
         info["orbit"].is_null()
