@@ -8,6 +8,7 @@
 #include <gtest/gtest.h>
 #include <nlohmann/json.hpp>
 #include <tiffio.h>
+#include <xtiffio.h>
 
 #include <fstream>
 #include <string>
@@ -85,6 +86,17 @@ nlohmann::json InfoJson(const std::string &name) {
                                 : nlohmann::json();
 }
 
+// The values of the file's RPC tag; none without one. libtiff reads the tag
+// it does not know with a 32-bit count.
+std::vector<double> RpcTag(const std::string &path) {
+    rs2test::TiffKeeper tiff(XTIFFOpen(path.c_str(), "r"));
+    uint32_t count = 0;
+    double *values = nullptr;
+    if (!tiff || TIFFGetField(tiff.get(), 50844, &count, &values) != 1)
+        return {};
+    return std::vector<double>(values, values + count);
+}
+
 } // namespace
 
 TEST(ExportControlPoints, a_slant_range_export_carries_every_grid_point) {
@@ -152,4 +164,41 @@ TEST(ExportControlPoints, info_reports_the_affine_misfit_in_metres) {
     EXPECT_NE(text.output.find("affine misfit          max "),
               std::string::npos)
         << text.output;
+}
+
+TEST(ExportControlPoints,
+     the_rpc_model_is_written_only_where_it_fits_the_grid) {
+    // The generated model is the exact inverse of the generated grid; the
+    // slant-range grid leaves it tens of pixels off.
+    const SlantRangeProduct slant;
+    const std::string bent = slant.out.File("bent.tif");
+    ASSERT_EQ(
+        RunShell(Rs2() + " export " + Quoted(slant.xml) + " " + Quoted(bent))
+            .exitCode,
+        0);
+    EXPECT_TRUE(RpcTag(bent).empty());
+
+    rs2test::TempDir folder;
+    rs2gen::ProductOptions options;
+    options.productType = "SLC";
+    options.polarizations = {"HH"};
+    options.width = 60;
+    options.height = 40;
+    const std::string xml =
+        rs2gen::GenerateProduct(folder.Path(), options).productXml;
+    const std::string out = folder.File("rpc.tif");
+    ASSERT_EQ(RunShell(Rs2() + " export " + Quoted(xml) + " " + Quoted(out) +
+                       " --window 10 5 30 20 --size 15 40")
+                  .exitCode,
+              0);
+    const std::vector<double> rpc = RpcTag(out);
+    ASSERT_EQ(rpc.size(), 92u);
+    // The model's centre, pixel 29.5 and line 19.5 counted from the first
+    // pixel's centre, lies at (30 - 10) / 2 - 0.5 and (20 - 5) / 0.5 - 0.5
+    // in the output grid; the scales of 30 columns and 20 lines shrink by
+    // the steps.
+    EXPECT_DOUBLE_EQ(rpc[2], 29.5); // line offset
+    EXPECT_DOUBLE_EQ(rpc[3], 9.5);  // sample offset
+    EXPECT_DOUBLE_EQ(rpc[7], 40.0); // line scale
+    EXPECT_DOUBLE_EQ(rpc[8], 15.0); // sample scale
 }

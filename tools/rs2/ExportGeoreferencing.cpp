@@ -1,6 +1,7 @@
 #include "tools/rs2/ExportGeoreferencing.hpp"
 
 #include "host/RasterServices.hpp"
+#include "tools/rs2/ExportRpc.hpp"
 #include "tools/rs2/TiePointGrid.hpp"
 
 #include <array>
@@ -101,7 +102,8 @@ std::string GeographicSystem() {
 // transform fits its tie points gives that transform, and its ground control
 // points join it in that system. Otherwise the control points alone
 // georeference the file, in WGS 84: every point of the geolocation grid, or
-// the dataset's own points when it states no grid.
+// the dataset's own points when it states no grid. The RPC model joins
+// either where it agrees with the grid.
 host::GeoTiffGeoreferencing OutputGeoreferencing(const host::Raster &raster,
                                                  const ExportPlan &plan) {
     host::GeoTiffGeoreferencing geo;
@@ -122,5 +124,7 @@ host::GeoTiffGeoreferencing OutputGeoreferencing(const host::Raster &raster,
         geo.tiePoints = DatasetTiePoints(raster, geo.geosys, plan);
     if (!geo.hasTransform && geo.tiePoints.empty())
         geo.geosys.clear();
+    else
+        geo.rpcCoefficients = OutputRpcCoefficients(raster, grid, plan);
     return geo;
 }
