@@ -1,3 +1,4 @@
+#include "host/GeoTiffWriter.hpp"
 #include "tests/support/CommandRun.hpp"
 #include "tests/support/TempDir.hpp"
 #include "tests/support/TiffContents.hpp"
@@ -10,7 +11,9 @@
 #include <tiffio.h>
 #include <xtiffio.h>
 
+#include <cstdlib>
 #include <fstream>
+#include <sstream>
 #include <string>
 #include <vector>
 
@@ -53,7 +56,10 @@ struct SlantRangeProduct {
         options.polarizations = {"HH"};
         options.width = 60;
         options.height = 40;
-        xml = rs2gen::GenerateProduct(folder.Path(), options).productXml;
+        const rs2gen::GeneratedProduct generated =
+            rs2gen::GenerateProduct(folder.Path(), options);
+        xml = generated.productXml;
+        image = generated.imageFiles[0];
         grid = SlantRangeGrid(options.width, options.height);
         std::string text = FileText(xml);
         const size_t begin = text.find("<geolocationGrid>");
@@ -75,8 +81,25 @@ struct SlantRangeProduct {
     rs2test::TempDir folder;
     rs2test::TempDir out;
     std::string xml;
+    std::string image;
     std::vector<StatedPoint> grid;
 };
+
+// Replaces the product's image by one whose samples tell where they stand:
+// in-phase column + 1, quadrature line + 1 (0 is left for no data).
+void WritePositionCodedImage(const std::string &path, int width, int height) {
+    host::GeoTiffWriter writer(path, width, height, 1,
+                               host::SampleType::ComplexInt16);
+    std::vector<int16_t> row(2 * static_cast<size_t>(width));
+    for (int line = 0; line < height; ++line) {
+        for (int column = 0; column < width; ++column) {
+            row[2 * column] = static_cast<int16_t>(column + 1);
+            row[2 * column + 1] = static_cast<int16_t>(line + 1);
+        }
+        writer.WriteRows(line, 1, row.data());
+    }
+    writer.Close();
+}
 
 nlohmann::json InfoJson(const std::string &name) {
     const CommandResult result =
@@ -201,4 +224,56 @@ TEST(ExportControlPoints,
     EXPECT_DOUBLE_EQ(rpc[3], 9.5);  // sample offset
     EXPECT_DOUBLE_EQ(rpc[7], 40.0); // line scale
     EXPECT_DOUBLE_EQ(rpc[8], 15.0); // sample scale
+}
+
+// GDAL reads what rs2 writes: the control points and no transform, and a
+// thin-plate-spline warp onto a map puts every tie point within one output
+// pixel of the pixel the product places there.
+TEST(ExportControlPoints, gdal_warps_a_slant_range_export_by_its_points) {
+    const SlantRangeProduct product;
+    WritePositionCodedImage(product.image, 60, 40);
+    const std::string out = product.out.File("slant.tif");
+    ASSERT_EQ(RunShell(Rs2() + " export " + Quoted(product.xml) + " " +
+                       Quoted(out) + " --window 10 5 40 30")
+                  .exitCode,
+              0);
+    const CommandResult info = RunShell("gdalinfo " + Quoted(out));
+    ASSERT_EQ(info.exitCode, 0) << info.errors;
+    EXPECT_EQ(info.output.find("GeoTransform"), std::string::npos);
+    size_t gcps = 0;
+    for (size_t at = info.output.find("GCP["); at != std::string::npos;
+         at = info.output.find("GCP[", at + 1))
+        ++gcps;
+    EXPECT_EQ(gcps, product.grid.size());
+
+    // Output pixels of about 4 m, a third of the image's.
+    const std::string warped = product.out.File("warped.tif");
+    const CommandResult warp =
+        RunShell("gdalwarp -q -tps -r near -t_srs EPSG:4326 -tr 5e-5 3e-5 " +
+                 Quoted(out) + " " + Quoted(warped));
+    ASSERT_EQ(warp.exitCode, 0) << warp.errors;
+    std::string places;
+    std::vector<const StatedPoint *> inside;
+    for (const StatedPoint &p : product.grid) {
+        if (p.pixel < 10 || p.pixel >= 50 || p.line < 5 || p.line >= 35)
+            continue;
+        inside.push_back(&p);
+        places += std::to_string(p.longitude) + " " +
+                  std::to_string(p.latitude) + "\n";
+    }
+    ASSERT_GE(inside.size(), 10u);
+    std::ofstream(product.out.File("places.txt")) << places;
+    const CommandResult values =
+        RunShell("gdallocationinfo -valonly -geoloc " + Quoted(warped) + " < " +
+                 Quoted(product.out.File("places.txt")));
+    ASSERT_EQ(values.exitCode, 0) << values.errors;
+    std::istringstream read(values.output);
+    for (const StatedPoint *p : inside) {
+        int column = 0, line = 0;
+        ASSERT_TRUE(read >> column >> line) << values.output;
+        EXPECT_LE(std::abs(column - 1 - p->pixel), 1)
+            << "tie point " << p->pixel << "," << p->line;
+        EXPECT_LE(std::abs(line - 1 - p->line), 1)
+            << "tie point " << p->pixel << "," << p->line;
+    }
 }
