@@ -28,8 +28,7 @@ json ChannelsJson(const host::Raster &raster) {
     return channels;
 }
 
-json ProjectionJson(const host::Raster &raster) {
-    ProjInfo_t projection = raster.Projection();
+json ProjectionJson(const ProjInfo_t &projection) {
     const double *t = projection.transform;
     return {{"geosys", projection.geosys},
             {"code", DecodeGeosys(projection.geosys, nullptr)},
@@ -38,12 +37,12 @@ json ProjectionJson(const host::Raster &raster) {
 
 // How far the dataset's affine UTM transform is from its geolocation grid,
 // in metres; null without a UTM transform or a grid to measure it against.
-json AffineMisfitJson(const host::Raster &raster) {
-    const ProjInfo_t projection = raster.Projection();
+json AffineMisfitJson(const ProjInfo_t &projection,
+                      const host::Entries &metadata) {
     if (DecodeGeosys(projection.geosys, nullptr) != kGeosysUTM)
         return nullptr;
     const AffineMisfit misfit =
-        MeasureAffineMisfit(projection, GeolocationGrid(raster));
+        MeasureAffineMisfit(projection, GeolocationGrid(metadata));
     if (misfit.mapDistance.empty())
         return nullptr;
     return {{"max_m", misfit.MaxMapDistance()},
@@ -153,9 +152,12 @@ json DescribeDataset(const host::Raster &raster) {
     info["height"] = raster.Height();
     info["object_name"] = raster.ObjectName();
     info["channels"] = ChannelsJson(raster);
-    info["metadata"] = EntriesJson(raster.Metadata(1));
-    info["projection"] = ProjectionJson(raster);
-    info["affine_misfit"] = AffineMisfitJson(raster);
+    // Both are built anew on every request; the misfit reuses them.
+    const host::Entries metadata = raster.Metadata(1);
+    const ProjInfo_t projection = raster.Projection();
+    info["metadata"] = EntriesJson(metadata);
+    info["projection"] = ProjectionJson(projection);
+    info["affine_misfit"] = AffineMisfitJson(projection, metadata);
     info["gcps"] = GcpsJson(raster);
     info["segments"] = SegmentsJson(raster);
     info["calibration_types"] = raster.CalibrationTypes();

@@ -108,7 +108,7 @@ host::GeoTiffGeoreferencing OutputGeoreferencing(const host::Raster &raster,
                                                  const ExportPlan &plan) {
     host::GeoTiffGeoreferencing geo;
     const ProjInfo_t projection = raster.Projection();
-    const std::vector<GridTiePoint> grid = GeolocationGrid(raster);
+    const std::vector<GridTiePoint> grid = GeolocationGrid(raster.Metadata(1));
     char system[kGeosysTextSize] = {};
     const int32_t code = DecodeGeosys(projection.geosys, system);
     if ((code == kGeosysUTM || code == kGeosysLong) &&

@@ -3,8 +3,9 @@
 #include "host/ProjectionServices.hpp"
 
 #include <algorithm>
+#include <charconv>
 #include <cmath>
-#include <cstdlib>
+#include <limits>
 #include <string>
 
 namespace {
@@ -13,12 +14,19 @@ namespace {
 // longitude, height, line, pixel.
 constexpr size_t kFieldsPerPoint = 5;
 
+// A field that is no number reads as NaN, so that its point is dropped.
+// from_chars, as it needs no locale, reads a large grid several times faster
+// than strtod.
 std::vector<double> SemicolonFields(const std::string &text) {
     std::vector<double> fields;
-    size_t start = 0;
-    for (size_t end = text.find(';'); end != std::string::npos;
-         start = end + 1, end = text.find(';', start))
-        fields.push_back(std::strtod(text.c_str() + start, nullptr));
+    const char *start = text.data();
+    const char *const stop = text.data() + text.size();
+    for (const char *end = std::find(start, stop, ';'); end != stop;
+         start = end + 1, end = std::find(start, stop, ';')) {
+        double value = std::numeric_limits<double>::quiet_NaN();
+        std::from_chars(start, end, value);
+        fields.push_back(value);
+    }
     return fields;
 }
 
@@ -30,9 +38,9 @@ bool IsFinite(const GridTiePoint &point) {
 
 } // namespace
 
-std::vector<GridTiePoint> GeolocationGrid(const host::Raster &raster) {
+std::vector<GridTiePoint> GeolocationGrid(const host::Entries &metadata) {
     std::vector<GridTiePoint> grid;
-    for (const auto &[key, value] : raster.Metadata(1)) {
+    for (const auto &[key, value] : metadata) {
         if (key != "GeolocationGrid")
             continue;
         const std::vector<double> fields = SemicolonFields(value);

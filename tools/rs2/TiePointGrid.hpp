@@ -13,10 +13,11 @@ struct GridTiePoint {
     double longitude, latitude, height; // degrees, metres
 };
 
-// Every tie point of the dataset's geolocation grid, as its GeolocationGrid
-// metadata entry lists them: all of them, where the ground control points
-// are a thinned selection. Empty when the dataset states no grid.
-std::vector<GridTiePoint> GeolocationGrid(const host::Raster &raster);
+// Every tie point of the dataset's geolocation grid, as the GeolocationGrid
+// entry of its metadata (object type 1) lists them: all of them, where the
+// ground control points are a thinned selection. Empty when the dataset
+// states no grid.
+std::vector<GridTiePoint> GeolocationGrid(const host::Entries &metadata);
 
 // How far an affine map transform is from the tie points: for each point,
 // the distance between where the transform puts its raster position and its
