@@ -7,8 +7,10 @@
 #include "host/ProjectionServices.hpp"
 #include "host/Raster.hpp"
 #include "tests/support/CommandRun.hpp"
+#include "tests/support/TempDir.hpp"
 
 #include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
 
 #include <algorithm>
 #include <cmath>
@@ -362,6 +364,41 @@ TEST_F(RealProduct, fitted_transform_reproduces_the_tie_points) {
     // between its ends by some 4 km. The bounds are those of such a plane.
     EXPECT_LT(worst, 5000.0);
     EXPECT_LT(rms, 3500.0);
+
+    // rs2 info reports the same misfit, to the few centimetres the six
+    // decimals of a degree in its GeolocationGrid entry keep.
+    const rs2test::CommandResult info = rs2test::RunShell(
+        rs2test::Quoted(RS2_TOOL) + " info --json " + rs2test::Quoted(kFolder));
+    ASSERT_EQ(info.exitCode, 0) << info.errors;
+    const nlohmann::json misfit =
+        nlohmann::json::parse(info.output)["affine_misfit"];
+    ASSERT_TRUE(misfit.is_object()) << misfit;
+    EXPECT_NEAR(misfit["max_m"].get<double>(), worst, 0.2);
+    EXPECT_NEAR(misfit["rms_m"].get<double>(), rms, 0.2);
+    EXPECT_EQ(misfit["tie_points"].get<size_t>(), ties.size());
+}
+
+// So no transform may stand for it in an export: GDAL finds every tie point
+// as a control point, no geotransform, and the RPC model, which this
+// product's tie points agree with.
+TEST_F(RealProduct, export_is_placed_by_every_tie_point_and_the_rpc_model) {
+    rs2test::TempDir out;
+    const std::string file = out.File("sigma.tif");
+    const rs2test::CommandResult result =
+        rs2test::RunShell(rs2test::Quoted(RS2_TOOL) + " export " +
+                          rs2test::Quoted(kProductXml + "?c=sigma") + " " +
+                          rs2test::Quoted(file) + " --size 1847 3047");
+    ASSERT_EQ(result.exitCode, 0) << result.errors;
+    const rs2test::CommandResult info =
+        rs2test::RunShell("gdalinfo " + rs2test::Quoted(file));
+    ASSERT_EQ(info.exitCode, 0) << info.errors;
+    size_t gcps = 0;
+    for (size_t at = info.output.find("GCP["); at != std::string::npos;
+         at = info.output.find("GCP[", at + 1))
+        ++gcps;
+    EXPECT_EQ(gcps, TiePoints(*xml).size());
+    EXPECT_EQ(info.output.find("GeoTransform"), std::string::npos);
+    EXPECT_NE(info.output.find("RPC Metadata"), std::string::npos);
 }
 
 TEST_F(RealProduct, opens_under_every_calibration_choice) {
