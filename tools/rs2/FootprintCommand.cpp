@@ -3,6 +3,7 @@
 // The outline is the border of the geolocation grid (SceneOutline), with the
 // product's identity and time as properties.
 
+#include "tools/generator/XmlWriter.hpp"
 #include "tools/rs2/Commands.hpp"
 #include "tools/rs2/DatasetChoice.hpp"
 #include "tools/rs2/JsonText.hpp"
@@ -92,28 +93,13 @@ std::string GeoJsonText(const Outline &outline, const Properties &properties) {
 // markup characters escaped, and the control characters XML 1.0 cannot
 // hold in any form replaced by U+FFFD.
 std::string XmlText(const std::string &text) {
-    std::string escaped;
+    std::string fit;
     for (const char c : ValidUtf8(text)) {
-        switch (c) {
-        case '&':
-            escaped += "&amp;";
-            break;
-        case '<':
-            escaped += "&lt;";
-            break;
-        case '>':
-            escaped += "&gt;";
-            break;
-        case '"':
-            escaped += "&quot;";
-            break;
-        default:
-            const bool forbidden = static_cast<unsigned char>(c) < 0x20 &&
-                                   c != '\t' && c != '\n' && c != '\r';
-            escaped += forbidden ? "\xEF\xBF\xBD" : std::string(1, c);
-        }
+        const bool forbidden = static_cast<unsigned char>(c) < 0x20 &&
+                               c != '\t' && c != '\n' && c != '\r';
+        fit += forbidden ? "\xEF\xBF\xBD" : std::string(1, c);
     }
-    return escaped;
+    return rs2gen::XmlEscaped(fit);
 }
 
 // The shortest text that reads back as the same double.
