@@ -1,5 +1,7 @@
 #include "host/GeoTiffWriter.hpp"
 
+#include "host/GdalMetadata.hpp"
+
 #include "host/ProjectionServices.hpp"
 #include "host/Raster.hpp"
 
@@ -34,6 +36,9 @@ constexpr int kUtmNorthBase = 32600;
 constexpr int kUtmSouthBase = 32700;
 // RPCCoefficientTag, where GeoTIFF readers look for an RPC model.
 constexpr ttag_t kRpcCoefficientTag = 50844;
+// Where GIS readers look for an image's own metadata and its nodata value.
+constexpr ttag_t kGdalMetadataTag = 42112;
+constexpr ttag_t kGdalNoDataTag = 42113;
 // Rows longer than this are refused: a strip holds at least one row.
 constexpr size_t kMaxRowBytes = size_t{1} << 30;
 
@@ -157,6 +162,7 @@ struct GeoTiffWriter::State {
     std::string path;
     int32_t width = 0;
     int32_t height = 0;
+    int32_t channelCount = 0;
     size_t rowBytes = 0;
     int32_t rowsPerStrip = 1;
     bool bigTiff = false;
@@ -164,6 +170,7 @@ struct GeoTiffWriter::State {
     int32_t bufferedRows = 0; // rows of the current strip held in strip
     std::vector<unsigned char> strip;
     bool georeferenced = false;
+    bool described = false;
     bool failed = false;
     // libtiff's latest error on this file, at a fixed address that outlives
     // the handle pointing to it.
@@ -271,6 +278,24 @@ struct GeoTiffWriter::State {
             Fail("cannot write the RPC tag");
     }
 
+    // libtiff knows neither GDAL tag: the handle learns them before they are
+    // set.
+    void WriteAsciiTag(ttag_t tag, const char *name, const std::string &text) {
+        if (text.empty())
+            return;
+        const TIFFFieldInfo field = {tag,
+                                     TIFF_VARIABLE,
+                                     TIFF_VARIABLE,
+                                     TIFF_ASCII,
+                                     FIELD_CUSTOM,
+                                     1,
+                                     0,
+                                     const_cast<char *>(name)};
+        if (TIFFMergeFieldInfo(tiff, &field, 1) != 0 ||
+            TIFFSetField(tiff, tag, text.c_str()) != 1)
+            Fail(std::string("cannot write the ") + name + " tag");
+    }
+
     void WriteModelKeys(const ModelSystem &system) {
         std::unique_ptr<GTIF, GtifDeleter> keys(
             GTIFNewEx(tiff, IgnoreGeoTiffMessage, nullptr));
@@ -351,6 +376,7 @@ GeoTiffWriter::GeoTiffWriter(const std::string &path, int32_t width,
     s.path = path;
     s.width = width;
     s.height = height;
+    s.channelCount = channels;
     s.rowBytes = pixelBytes * static_cast<size_t>(width);
     s.rowsPerStrip = static_cast<int32_t>(std::clamp<size_t>(
         kStripBytes / s.rowBytes, 1, static_cast<size_t>(height)));
@@ -395,6 +421,24 @@ void GeoTiffWriter::SetGeoreferencing(const GeoTiffGeoreferencing &geo) {
     s.WriteRpcTag(geo.rpcCoefficients);
     s.WriteModelKeys(system);
     s.georeferenced = true;
+}
+
+void GeoTiffWriter::SetDescription(const GeoTiffDescription &description) {
+    State &s = *state;
+    s.RequireOpen();
+    if (s.described || s.nextRow > 0 || s.bufferedRows > 0)
+        throw std::logic_error(
+            s.path + ": the description is set once, before the first row");
+    if (!description.bands.empty() &&
+        description.bands.size() != static_cast<size_t>(s.channelCount))
+        throw std::invalid_argument(
+            s.path + ": " + std::to_string(description.bands.size()) +
+            " band descriptions for " + std::to_string(s.channelCount) +
+            " channel(s)");
+    s.WriteAsciiTag(kGdalMetadataTag, "GDALMetadata",
+                    GdalMetadataXml(description));
+    s.WriteAsciiTag(kGdalNoDataTag, "GDALNoDataValue", description.noData);
+    s.described = true;
 }
 
 void GeoTiffWriter::WriteRows(int32_t firstRow, int32_t rowCount,

@@ -9,6 +9,7 @@
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace host {
@@ -59,6 +60,23 @@ struct GeoTiffGeoreferencing {
     std::vector<double> rpcCoefficients;
 };
 
+/// What a written image says about itself to GIS readers: the items of the
+/// GDAL metadata tag (42112) and the nodata value of the GDAL nodata tag
+/// (42113).
+struct GeoTiffDescription {
+    /// Items of the whole image, name and value, written in this order.
+    std::vector<std::pair<std::string, std::string>> items;
+    /// Per channel (empty, or one entry a channel): its description, read by
+    /// GIS software as the band's name, and its own items.
+    struct Band {
+        std::string description;
+        std::vector<std::pair<std::string, std::string>> items;
+    };
+    std::vector<Band> bands;
+    /// The value that marks "no data" ("nan", "0", ...); empty: none.
+    std::string noData;
+};
+
 /// A new stripped, uncompressed GeoTIFF written row band by row band, so a
 /// large image never has to be held in memory. It owns its libtiff and
 /// libgeotiff handles; libtiff's messages go to a per-file handler and become
@@ -94,6 +112,11 @@ class VXB_API GeoTiffWriter {
     /// transform, non-finite or too many tie points, neither transform nor
     /// tie points, or RPC values of another count or not finite.
     void SetGeoreferencing(const GeoTiffGeoreferencing &georeferencing);
+
+    /// Sets the GDAL metadata and nodata tags, once, before the first row
+    /// (else std::logic_error). Throws std::invalid_argument when bands is
+    /// neither empty nor one entry a channel.
+    void SetDescription(const GeoTiffDescription &description);
 
     /// Writes rowCount rows starting at firstRow from data (rowCount x
     /// RowBytes() bytes). Rows come in order: firstRow is the first row not

@@ -334,3 +334,52 @@ TEST(GeoTiffWriter, refuses_georeferencing_it_cannot_state) {
             << geo.geosys;
     }
 }
+
+TEST(GeoTiffWriter, descriptions_become_the_gdal_metadata_and_nodata_tags) {
+    constexpr ttag_t kMetadataTag = 42112;
+    constexpr ttag_t kNoDataTag = 42113;
+    struct Case {
+        host::GeoTiffDescription description;
+        std::string metadata, noData;
+    };
+    const Case cases[] = {
+        // Image items, then each band's description and items; markup in
+        // values is escaped.
+        {{{{"UNITS", "dB"}, {"PRODUCT_ID", "a<b&\"c\">"}},
+          {{"HH", {{"POLARIZATION", "HH"}}}, {"", {{"POLARIZATION", "HV"}}}},
+          "nan"},
+         "<GDALMetadata>\n"
+         "  <Item name=\"UNITS\">dB</Item>\n"
+         "  <Item name=\"PRODUCT_ID\">a&lt;b&amp;&quot;c&quot;&gt;</Item>\n"
+         "  <Item name=\"DESCRIPTION\" sample=\"0\" "
+         "role=\"description\">HH</Item>\n"
+         "  <Item name=\"POLARIZATION\" sample=\"0\">HH</Item>\n"
+         "  <Item name=\"POLARIZATION\" sample=\"1\">HV</Item>\n"
+         "</GDALMetadata>\n",
+         "nan"},
+        // Nothing to say: neither tag.
+        {{}, "", ""},
+    };
+    rs2test::TempDir folder;
+    const std::vector<unsigned char> rows(2 * 4 * 3);
+    for (const Case &c : cases) {
+        const std::string path = folder.File("described.tif");
+        {
+            host::GeoTiffWriter writer(path, 3, 1, 2,
+                                       host::SampleType::Float32);
+            writer.SetDescription(c.description);
+            writer.WriteRows(0, 1, rows.data());
+            EXPECT_THROW(writer.SetDescription(c.description),
+                         std::logic_error);
+            writer.Close();
+        }
+        TiffKeeper tiff = OpenForReading(path);
+        ASSERT_TRUE(tiff);
+        EXPECT_EQ(rs2test::AsciiTag(tiff.get(), kMetadataTag), c.metadata);
+        EXPECT_EQ(rs2test::AsciiTag(tiff.get(), kNoDataTag), c.noData);
+    }
+    host::GeoTiffWriter writer(folder.File("bands.tif"), 3, 1, 2,
+                               host::SampleType::Float32);
+    EXPECT_THROW(writer.SetDescription({{}, {{"HH", {}}}, ""}),
+                 std::invalid_argument); // one band of two described
+}

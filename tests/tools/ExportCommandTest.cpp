@@ -409,6 +409,60 @@ TEST(ExportCommand, draws_progress_only_on_a_terminal) {
         << terminal.output;
 }
 
+// GDAL, reading what rs2 writes, names each band by its polarization and
+// finds the product's identity, the units and the nodata value.
+TEST(ExportCommand, gdal_reads_the_bands_and_metadata_an_export_declares) {
+    const Product sgf(Options("SGF", 23, 11));
+    const Product slc(Options("SLC", 19, 9));
+    struct Case {
+        const Product *product;
+        std::string arguments;
+        std::string units, calibration;
+        bool nanIsNoData;
+    };
+    const Case cases[] = {
+        {&sgf, "", "DN", "None", false},
+        {&sgf, "?c=sigma --denoise --db", "dB", "Sigma0", true},
+        {&sgf, "?c=beta --looks 2x2", "linear", "Beta0", false},
+        {&slc, "?c=gamma", "linear", "Gamma", false},
+    };
+    for (const Case &c : cases) {
+        const Product &p = *c.product;
+        const std::string label = p.options.productType + c.arguments;
+        const std::string out = p.out.File("described.tif");
+        const std::string name = c.arguments.substr(0, c.arguments.find(' '));
+        const std::string options = c.arguments.substr(name.size());
+        const CommandResult result = RunShell(Rs2() + " export " + p.Xml(name) +
+                                              " " + Quoted(out) + options);
+        ASSERT_EQ(result.exitCode, 0) << label << ": " << result.errors;
+        const CommandResult info = RunShell("gdalinfo -json " + Quoted(out));
+        ASSERT_EQ(info.exitCode, 0) << label << ": " << info.errors;
+        const auto json = nlohmann::json::parse(info.output);
+        const auto &items = json["metadata"][""];
+        EXPECT_EQ(items.value("UNITS", ""), c.units) << label;
+        EXPECT_EQ(items.value("CALIBRATION", ""), c.calibration) << label;
+        EXPECT_EQ(items.value("PRODUCT_TYPE", ""), p.options.productType)
+            << label;
+        EXPECT_EQ(items.value("SATELLITE", ""), "RADARSAT-2") << label;
+        const std::vector<std::string> expected =
+            options.find("--channels 2") != std::string::npos
+                ? std::vector<std::string>{"HV"}
+                : p.options.polarizations;
+        ASSERT_EQ(json["bands"].size(), expected.size()) << label;
+        for (size_t band = 0; band < expected.size(); ++band) {
+            const auto &b = json["bands"][band];
+            EXPECT_EQ(b.value("description", ""), expected[band]) << label;
+            EXPECT_EQ(b["metadata"][""].value("POLARIZATION", ""),
+                      expected[band])
+                << label;
+            EXPECT_EQ(b.contains("noDataValue"), c.nanIsNoData) << label;
+            if (c.nanIsNoData) {
+                EXPECT_EQ(b["noDataValue"], "NaN") << label;
+            }
+        }
+    }
+}
+
 TEST(ExportCommand, product_folders_are_names_of_their_product) {
     const Product sgf(Options("SGF", 24, 16));
     const std::string folder = sgf.folder.Path();

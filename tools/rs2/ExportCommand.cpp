@@ -7,6 +7,7 @@
 #include "tools/rs2/CalibrationCheck.hpp"
 #include "tools/rs2/Commands.hpp"
 #include "tools/rs2/DatasetChoice.hpp"
+#include "tools/rs2/ExportDescription.hpp"
 #include "tools/rs2/ExportGeoreferencing.hpp"
 #include "tools/rs2/ExportPlan.hpp"
 #include "tools/rs2/PartFile.hpp"
@@ -236,6 +237,7 @@ void RunExport(ExportOptions options) {
                                    static_cast<int32_t>(plan.channels.size()),
                                    plan.sampleType);
         writer.SetGeoreferencing(geo);
+        writer.SetDescription(DescribeExport(raster, plan));
         if (plan.backscatter)
             WriteBackscatter(raster, plan, writer);
         else
@@ -297,6 +299,10 @@ void AddExportCommand(CLI::App &app) {
         "averages power over A lines by R columns (edge blocks over the "
         "samples they hold) and scales the georeferencing to match. The "
         "steps apply in this order: power, noise, looks, dB.\n"
+        "Each band is named by its channel's polarization; the GDAL metadata "
+        "tag holds the product id and type, satellite, beam mode, first-line "
+        "time, pass direction, calibration and units (DN, DN^2, linear, dB), "
+        "and with --db the nodata value is nan.\n"
         "The file is written as OUT.part-XXXXXX beside OUT and renamed when "
         "complete; nothing is left behind on failure or interruption. An "
         "existing OUT is replaced only when it is a regular file with write "
