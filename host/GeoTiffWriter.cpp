@@ -57,7 +57,7 @@ SampleLayout LayoutOf(SampleType type) {
     case SampleType::Int32:
         return {32, SAMPLEFORMAT_INT, 1};
     case SampleType::ComplexInt16:
-        return {16, SAMPLEFORMAT_INT, 2};
+        return {32, SAMPLEFORMAT_COMPLEXINT, 1};
     }
     throw std::invalid_argument("unknown sample type");
 }

@@ -33,8 +33,7 @@ enum class SampleType {
     Float32,        ///< one IEEE float
     ComplexFloat32, ///< in-phase and quadrature floats, one 64-bit sample
     Int32,          ///< one signed 32-bit integer
-    /// in-phase and quadrature as two signed 16-bit samples, so a channel
-    /// takes two samples of the pixel
+    /// in-phase and quadrature signed 16-bit integers, one 32-bit sample
     ComplexInt16,
 };
 

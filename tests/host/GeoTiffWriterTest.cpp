@@ -85,7 +85,7 @@ TEST(GeoTiffWriter, sample_types_have_their_tiff_layout_and_round_trip) {
         {host::SampleType::Float32, 3, 32, SAMPLEFORMAT_IEEEFP, 3, 12},
         {host::SampleType::ComplexFloat32, 2, 64, SAMPLEFORMAT_COMPLEXIEEEFP, 2, 16},
         {host::SampleType::Int32, 2, 32, SAMPLEFORMAT_INT, 2, 8},
-        {host::SampleType::ComplexInt16, 2, 16, SAMPLEFORMAT_INT, 4, 8},
+        {host::SampleType::ComplexInt16, 2, 32, SAMPLEFORMAT_COMPLEXINT, 2, 8},
     };
     // clang-format on
     rs2test::TempDir folder;

@@ -80,8 +80,9 @@ class BandBuffer {
     const float *Reals() const { return reals.data(); }
     const int32_t *Words() const { return words.data(); }
 
-    // A word packs in-phase (low half) and quadrature (high half); the file
-    // wants the two int16 samples in that order, in native byte order.
+    // A word packs in-phase (low half) and quadrature (high half); a complex
+    // int16 sample of the file holds the two in that order, in native byte
+    // order.
     void SplitComplexWords() {
         for (size_t i = 0; i < words.size(); ++i) {
             const auto word = static_cast<uint32_t>(words[i]);
@@ -146,7 +147,7 @@ const char *SampleTypeName(host::SampleType type) {
     case host::SampleType::Int32:
         return "int32";
     case host::SampleType::ComplexInt16:
-        return "int16 I/Q pairs";
+        return "complex int16";
     }
     return "";
 }
@@ -285,7 +286,7 @@ void AddExportCommand(CLI::App &app) {
                         "AxR: mean power of blocks of A lines by R columns");
     command->footer(
         "Samples: complex channels are written as complex float32 when "
-        "calibrated, as in-phase/quadrature int16 pairs when raw; detected "
+        "calibrated, as complex int16 when raw; detected "
         "channels as float32 (calibrated) or int32 (raw).\n"
         "Backscatter (--db, --denoise, --looks): one float32 value of power "
         "per channel and pixel. Power is the calibrated value of a detected "
