@@ -24,10 +24,11 @@
 namespace host {
 namespace {
 
-// Strips of about this many bytes: large enough that libtiff's per-strip
-// work does not show, small enough that a strip is cheap to hold.
-constexpr size_t kStripBytes = size_t{256} << 10;
-// A classic TIFF addresses 4 GiB; what the tags and the strip tables take
+// Square tiles of this many pixels a side: GIS software reads any part of
+// the image, or an overview of it, without decoding whole rows, and 512 is
+// the size most of it uses itself.
+constexpr int32_t kTileSize = 512;
+// A classic TIFF addresses 4 GiB; what the tags and the tile tables take
 // beyond the pixels stays far below this margin.
 constexpr uint64_t kClassicTiffLimit = 0xFFFFFFFFull;
 constexpr uint64_t kTagMargin = uint64_t{64} << 20;
@@ -39,8 +40,9 @@ constexpr ttag_t kRpcCoefficientTag = 50844;
 // Where GIS readers look for an image's own metadata and its nodata value.
 constexpr ttag_t kGdalMetadataTag = 42112;
 constexpr ttag_t kGdalNoDataTag = 42113;
-// Rows longer than this are refused: a strip holds at least one row.
-constexpr size_t kMaxRowBytes = size_t{1} << 30;
+// Rows longer than this are refused: a row of tiles, which the writer
+// assembles in memory, holds kTileSize of them (at most 2 GiB then).
+constexpr size_t kMaxRowBytes = size_t{4} << 20;
 
 struct SampleLayout {
     uint16_t bitsPerSample;
@@ -60,6 +62,31 @@ SampleLayout LayoutOf(SampleType type) {
         return {32, SAMPLEFORMAT_COMPLEXINT, 1};
     }
     throw std::invalid_argument("unknown sample type");
+}
+
+uint16_t CompressionScheme(GeoTiffCompression compression) {
+    switch (compression) {
+    case GeoTiffCompression::None:
+        return COMPRESSION_NONE;
+    case GeoTiffCompression::Deflate:
+        return COMPRESSION_ADOBE_DEFLATE;
+    case GeoTiffCompression::Zstd:
+        return COMPRESSION_ZSTD;
+    case GeoTiffCompression::Lzw:
+        return COMPRESSION_LZW;
+    }
+    throw std::invalid_argument("unknown compression");
+}
+
+// Differences between neighbours compress better than the values: integers
+// take the plain difference, floats libtiff's byte-plane difference, which
+// it applies to real floats only, so complex floats go without.
+uint16_t PredictorFor(SampleType type, GeoTiffCompression compression) {
+    if (compression == GeoTiffCompression::None ||
+        type == SampleType::ComplexFloat32)
+        return PREDICTOR_NONE;
+    return type == SampleType::Float32 ? PREDICTOR_FLOATINGPOINT
+                                       : PREDICTOR_HORIZONTAL;
 }
 
 int KeepError(TIFF *, void *lastError, const char *module, const char *format,
@@ -164,11 +191,12 @@ struct GeoTiffWriter::State {
     int32_t height = 0;
     int32_t channelCount = 0;
     size_t rowBytes = 0;
-    int32_t rowsPerStrip = 1;
+    size_t pixelBytes = 0;
     bool bigTiff = false;
-    int32_t nextRow = 0;      // first row of the strip being assembled
-    int32_t bufferedRows = 0; // rows of the current strip held in strip
-    std::vector<unsigned char> strip;
+    int32_t nextRow = 0;      // first row of the tile row being assembled
+    int32_t bufferedRows = 0; // rows of that tile row held in tileRow
+    std::vector<unsigned char> tileRow;
+    std::vector<unsigned char> tile; // one tile, as libtiff encodes it
     bool georeferenced = false;
     bool described = false;
     bool failed = false;
@@ -205,32 +233,49 @@ struct GeoTiffWriter::State {
             throw std::logic_error(path + ": the GeoTIFF writer is closed");
     }
 
-    int32_t StripRows(int32_t firstRow) const {
-        return std::min(rowsPerStrip, height - firstRow);
+    int32_t TileRowRows(int32_t firstRow) const {
+        return std::min(kTileSize, height - firstRow);
     }
 
-    void WriteStrip(int32_t firstRow, const unsigned char *data) {
-        const tmsize_t bytes =
-            static_cast<tmsize_t>(rowBytes) * StripRows(firstRow);
-        // libtiff alters the buffer only to swap bytes, and a file created
-        // here is in native byte order: the caller's rows stay as they are.
-        if (TIFFWriteEncodedStrip(
-                tiff, static_cast<uint32_t>(firstRow / rowsPerStrip),
-                const_cast<unsigned char *>(data), bytes) != bytes)
-            Fail("cannot write rows " + std::to_string(firstRow) + " to " +
-                 std::to_string(firstRow + StripRows(firstRow) - 1));
+    // Cuts the rows of one row of tiles (TileRowRows(firstRow) rows of
+    // data) into its tiles and writes them. Tiles beyond the right or bottom
+    // edge are filled with zeros.
+    void WriteTileRow(int32_t firstRow, const unsigned char *data) {
+        const size_t tileRowBytes = pixelBytes * kTileSize;
+        if (tile.empty())
+            tile.resize(tileRowBytes * kTileSize);
+        const int32_t rows = TileRowRows(firstRow);
+        for (int32_t x = 0; x < width; x += kTileSize) {
+            const size_t bytes =
+                pixelBytes *
+                static_cast<size_t>(std::min(kTileSize, width - x));
+            if (bytes < tileRowBytes || rows < kTileSize)
+                std::fill(tile.begin(), tile.end(), 0);
+            for (int32_t row = 0; row < rows; ++row)
+                std::memcpy(tile.data() + tileRowBytes * row,
+                            data + rowBytes * row + pixelBytes * x, bytes);
+            const uint32_t index =
+                TIFFComputeTile(tiff, static_cast<uint32_t>(x),
+                                static_cast<uint32_t>(firstRow), 0, 0);
+            if (TIFFWriteEncodedTile(tiff, index, tile.data(),
+                                     static_cast<tmsize_t>(tile.size())) < 0)
+                Fail("cannot write rows " + std::to_string(firstRow) + " to " +
+                     std::to_string(firstRow + rows - 1));
+        }
     }
 
-    // Appends count rows to the strip being assembled.
+    // Appends count rows to the row of tiles being assembled.
     void Buffer(const unsigned char *rows, int32_t count) {
-        if (strip.empty())
-            strip.resize(rowBytes * static_cast<size_t>(rowsPerStrip));
-        std::memcpy(strip.data() + rowBytes * static_cast<size_t>(bufferedRows),
+        if (tileRow.empty())
+            tileRow.resize(rowBytes * static_cast<size_t>(kTileSize));
+        std::memcpy(tileRow.data() +
+                        rowBytes * static_cast<size_t>(bufferedRows),
                     rows, rowBytes * static_cast<size_t>(count));
         bufferedRows += count;
     }
 
-    void SetLayout(int32_t channels, SampleType type) {
+    void SetLayout(int32_t channels, SampleType type,
+                   GeoTiffCompression compression) {
         const SampleLayout layout = LayoutOf(type);
         const auto samples =
             static_cast<uint16_t>(channels * layout.samplesPerChannel);
@@ -246,8 +291,8 @@ struct GeoTiffWriter::State {
                 1 &&
             TIFFSetField(tiff, TIFFTAG_PHOTOMETRIC, PHOTOMETRIC_MINISBLACK) ==
                 1 &&
-            TIFFSetField(tiff, TIFFTAG_COMPRESSION, COMPRESSION_NONE) == 1 &&
-            TIFFSetField(tiff, TIFFTAG_ROWSPERSTRIP, rowsPerStrip) == 1;
+            TIFFSetField(tiff, TIFFTAG_TILEWIDTH, kTileSize) == 1 &&
+            TIFFSetField(tiff, TIFFTAG_TILELENGTH, kTileSize) == 1;
         if (set && samples > 1) {
             // Beyond the grey sample, every sample is a plain value.
             std::vector<uint16_t> extra(samples - 1u, EXTRASAMPLE_UNSPECIFIED);
@@ -257,6 +302,19 @@ struct GeoTiffWriter::State {
         }
         if (!set)
             Fail("cannot set the image layout");
+        SetCompression(type, compression);
+    }
+
+    void SetCompression(SampleType type, GeoTiffCompression compression) {
+        const uint16_t scheme = CompressionScheme(compression);
+        if (!TIFFIsCODECConfigured(scheme))
+            Fail("this libtiff cannot compress with " +
+                 std::string(CompressionName(compression)));
+        const uint16_t predictor = PredictorFor(type, compression);
+        if (TIFFSetField(tiff, TIFFTAG_COMPRESSION, scheme) != 1 ||
+            (predictor != PREDICTOR_NONE &&
+             TIFFSetField(tiff, TIFFTAG_PREDICTOR, predictor) != 1))
+            Fail("cannot set the compression");
     }
 
     // libtiff knows no RPC tag: the handle learns it before it is set.
@@ -357,8 +415,23 @@ struct GeoTiffWriter::State {
     }
 };
 
+const char *CompressionName(GeoTiffCompression compression) {
+    switch (compression) {
+    case GeoTiffCompression::None:
+        return "none";
+    case GeoTiffCompression::Deflate:
+        return "deflate";
+    case GeoTiffCompression::Zstd:
+        return "zstd";
+    case GeoTiffCompression::Lzw:
+        return "lzw";
+    }
+    return "";
+}
+
 GeoTiffWriter::GeoTiffWriter(const std::string &path, int32_t width,
-                             int32_t height, int32_t channels, SampleType type)
+                             int32_t height, int32_t channels, SampleType type,
+                             GeoTiffCompression compression)
     : state(std::make_unique<State>()) {
     if (width < 1 || height < 1 || channels < 1)
         throw std::invalid_argument(
@@ -377,10 +450,14 @@ GeoTiffWriter::GeoTiffWriter(const std::string &path, int32_t width,
     s.width = width;
     s.height = height;
     s.channelCount = channels;
+    s.pixelBytes = pixelBytes;
     s.rowBytes = pixelBytes * static_cast<size_t>(width);
-    s.rowsPerStrip = static_cast<int32_t>(std::clamp<size_t>(
-        kStripBytes / s.rowBytes, 1, static_cast<size_t>(height)));
-    const uint64_t imageBytes = static_cast<uint64_t>(s.rowBytes) * height;
+    // Tiles at the edges are whole tiles in the file.
+    const auto tiles = [](int32_t pixels) {
+        return static_cast<uint64_t>(pixels + kTileSize - 1) / kTileSize;
+    };
+    const uint64_t imageBytes =
+        tiles(width) * tiles(height) * kTileSize * kTileSize * pixelBytes;
     s.bigTiff = imageBytes + kTagMargin > kClassicTiffLimit;
 
     // The GeoTIFF tags are known to libtiff only once libgeotiff has
@@ -396,14 +473,14 @@ GeoTiffWriter::GeoTiffWriter(const std::string &path, int32_t width,
     s.tiff = TIFFOpenExt(path.c_str(), s.bigTiff ? "w8" : "w", options.get());
     if (s.tiff == nullptr)
         s.Fail("cannot create the file");
-    s.SetLayout(channels, type);
+    s.SetLayout(channels, type, compression);
 }
 
 GeoTiffWriter::~GeoTiffWriter() = default;
 
 size_t GeoTiffWriter::RowBytes() const { return state->rowBytes; }
 
-int32_t GeoTiffWriter::RowsPerStrip() const { return state->rowsPerStrip; }
+int32_t GeoTiffWriter::RowsPerTileRow() const { return kTileSize; }
 
 bool GeoTiffWriter::IsBigTiff() const { return state->bigTiff; }
 
@@ -455,19 +532,19 @@ void GeoTiffWriter::WriteRows(int32_t firstRow, int32_t rowCount,
     const auto *rows = static_cast<const unsigned char *>(data);
     int32_t remaining = rowCount;
     while (remaining > 0) {
-        const int32_t stripRows = s.StripRows(s.nextRow);
-        const int32_t take = std::min(remaining, stripRows - s.bufferedRows);
-        if (take == stripRows) {
-            s.WriteStrip(s.nextRow, rows);
+        const int32_t tileRowRows = s.TileRowRows(s.nextRow);
+        const int32_t take = std::min(remaining, tileRowRows - s.bufferedRows);
+        if (take == tileRowRows) {
+            s.WriteTileRow(s.nextRow, rows);
         } else {
             s.Buffer(rows, take);
-            if (s.bufferedRows == stripRows) {
-                s.WriteStrip(s.nextRow, s.strip.data());
+            if (s.bufferedRows == tileRowRows) {
+                s.WriteTileRow(s.nextRow, s.tileRow.data());
                 s.bufferedRows = 0;
             }
         }
         if (s.bufferedRows == 0)
-            s.nextRow += stripRows;
+            s.nextRow += tileRowRows;
         rows += s.rowBytes * static_cast<size_t>(take);
         remaining -= take;
     }

@@ -37,6 +37,13 @@ enum class SampleType {
     ComplexInt16,
 };
 
+/// How the tiles of a written image are compressed, all without loss.
+enum class GeoTiffCompression { None, Deflate, Zstd, Lzw };
+
+/// The name of a compression as options spell it ("none", "deflate",
+/// "zstd", "lzw").
+VXB_API const char *CompressionName(GeoTiffCompression compression);
+
 /// Where a written image lies on the ground. The raster positions follow
 /// the host's pixel-is-area convention (see ProjInfo_t): the file says
 /// RasterPixelIsArea and takes transform and tie points as they are.
@@ -76,8 +83,10 @@ struct GeoTiffDescription {
     std::string noData;
 };
 
-/// A new stripped, uncompressed GeoTIFF written row band by row band, so a
-/// large image never has to be held in memory. It owns its libtiff and
+/// A new GeoTIFF of 512 x 512 tiles, uncompressed or compressed without
+/// loss (integers with the horizontal predictor, real floats with the
+/// floating-point one), written row band by row band: only one row of tiles
+/// is held in memory, so a large image never has to be. It owns its libtiff and
 /// libgeotiff handles; libtiff's messages go to a per-file handler and become
 /// the reason of the failure they belong to, never printed. The file is a
 /// BigTIFF when a classic TIFF could not address it. Pixels are
@@ -90,18 +99,19 @@ class VXB_API GeoTiffWriter {
     /// Creates path (replacing a file there) for an image of width x height
     /// pixels of channels channels. Throws std::invalid_argument for sizes
     /// below 1 or a row too long to address, host::Error(kErrWriteFailed)
-    /// naming the file when it cannot be created.
+    /// naming the file when it cannot be created or libtiff lacks the codec.
     GeoTiffWriter(const std::string &path, int32_t width, int32_t height,
-                  int32_t channels, SampleType type);
+                  int32_t channels, SampleType type,
+                  GeoTiffCompression compression = GeoTiffCompression::None);
     ~GeoTiffWriter();
     GeoTiffWriter(const GeoTiffWriter &) = delete;
     GeoTiffWriter &operator=(const GeoTiffWriter &) = delete;
 
     /// Bytes of one row of pixels, as WriteRows expects them.
     size_t RowBytes() const;
-    /// Rows per strip of the file; bands of a multiple of it are written
-    /// without being copied.
-    int32_t RowsPerStrip() const;
+    /// Rows of a row of tiles; bands of a multiple of it are cut into tiles
+    /// without being buffered first.
+    int32_t RowsPerTileRow() const;
     /// True when the file is a BigTIFF.
     bool IsBigTiff() const;
 

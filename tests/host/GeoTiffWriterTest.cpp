@@ -1,6 +1,7 @@
 #include "host/GeoTiffWriter.hpp"
 #include "host/Raster.hpp"
 #include "tests/support/TempDir.hpp"
+#include "tests/support/TiffContents.hpp"
 #include "tests/support/TiffInspection.hpp"
 
 #include <geotiffio.h>
@@ -61,49 +62,50 @@ std::vector<unsigned char> Pattern(size_t bytes) {
     return data;
 }
 
-std::vector<unsigned char> ReadAllRows(TIFF *tiff, size_t rowBytes,
-                                       uint32_t height) {
-    std::vector<unsigned char> data(rowBytes * height);
-    for (uint32_t row = 0; row < height; ++row)
-        if (TIFFReadScanline(tiff, data.data() + rowBytes * row, row, 0) != 1)
-            return {};
-    return data;
-}
-
 } // namespace
 
 TEST(GeoTiffWriter, sample_types_have_their_tiff_layout_and_round_trip) {
+    using Compression = host::GeoTiffCompression;
     struct Case {
         host::SampleType type;
         int32_t channels;
+        Compression compression;
         uint16_t bits, format, samples;
         size_t pixelBytes;
+        uint16_t scheme, predictor;
     };
     // clang-format off
     const Case cases[] = {
-        {host::SampleType::Float32, 1, 32, SAMPLEFORMAT_IEEEFP, 1, 4},
-        {host::SampleType::Float32, 3, 32, SAMPLEFORMAT_IEEEFP, 3, 12},
-        {host::SampleType::ComplexFloat32, 2, 64, SAMPLEFORMAT_COMPLEXIEEEFP, 2, 16},
-        {host::SampleType::Int32, 2, 32, SAMPLEFORMAT_INT, 2, 8},
-        {host::SampleType::ComplexInt16, 2, 32, SAMPLEFORMAT_COMPLEXINT, 2, 8},
+        {host::SampleType::Float32, 1, Compression::None, 32, SAMPLEFORMAT_IEEEFP, 1, 4, COMPRESSION_NONE, PREDICTOR_NONE},
+        {host::SampleType::Float32, 3, Compression::Deflate, 32, SAMPLEFORMAT_IEEEFP, 3, 12, COMPRESSION_ADOBE_DEFLATE, PREDICTOR_FLOATINGPOINT},
+        {host::SampleType::ComplexFloat32, 2, Compression::None, 64, SAMPLEFORMAT_COMPLEXIEEEFP, 2, 16, COMPRESSION_NONE, PREDICTOR_NONE},
+        {host::SampleType::ComplexFloat32, 1, Compression::Zstd, 64, SAMPLEFORMAT_COMPLEXIEEEFP, 1, 8, COMPRESSION_ZSTD, PREDICTOR_NONE},
+        {host::SampleType::Int32, 2, Compression::None, 32, SAMPLEFORMAT_INT, 2, 8, COMPRESSION_NONE, PREDICTOR_NONE},
+        {host::SampleType::Int32, 1, Compression::Zstd, 32, SAMPLEFORMAT_INT, 1, 4, COMPRESSION_ZSTD, PREDICTOR_HORIZONTAL},
+        {host::SampleType::ComplexInt16, 2, Compression::None, 32, SAMPLEFORMAT_COMPLEXINT, 2, 8, COMPRESSION_NONE, PREDICTOR_NONE},
+        {host::SampleType::ComplexInt16, 2, Compression::Lzw, 32, SAMPLEFORMAT_COMPLEXINT, 2, 8, COMPRESSION_LZW, PREDICTOR_HORIZONTAL},
     };
     // clang-format on
     rs2test::TempDir folder;
-    // Strips of 5 to 21 rows for these pixel sizes, the last one short.
-    const int32_t width = 3001;
-    const int32_t height = 23;
+    // Two columns and three rows of tiles, those at the right and bottom
+    // edges partly outside the image.
+    const int32_t width = 530;
+    const int32_t height = 1030;
     for (const Case &c : cases) {
+        const std::string label = std::to_string(c.bits) + " bits, " +
+                                  std::to_string(c.channels) + " channel(s), " +
+                                  host::CompressionName(c.compression);
         const std::string path = folder.File("layout.tif");
         const std::vector<unsigned char> data =
             Pattern(c.pixelBytes * width * height);
-        int32_t stripRows = 0;
         {
-            host::GeoTiffWriter writer(path, width, height, c.channels, c.type);
+            host::GeoTiffWriter writer(path, width, height, c.channels, c.type,
+                                       c.compression);
             ASSERT_EQ(writer.RowBytes(), c.pixelBytes * width);
-            stripRows = writer.RowsPerStrip();
-            // Bands that start and end inside strips, then whole strips.
+            const int32_t tileRow = writer.RowsPerTileRow();
+            // Bands that start and end inside rows of tiles, then whole ones.
             int32_t row = 0;
-            for (int32_t rows : {1, stripRows + 1, 2 * stripRows, height}) {
+            for (int32_t rows : {1, tileRow + 1, 2 * tileRow, height}) {
                 rows = std::min(rows, height - row);
                 writer.WriteRows(row, rows,
                                  data.data() + writer.RowBytes() * row);
@@ -112,17 +114,22 @@ TEST(GeoTiffWriter, sample_types_have_their_tiff_layout_and_round_trip) {
             writer.Close();
         }
         TiffKeeper tiff = OpenForReading(path);
-        ASSERT_TRUE(tiff) << c.bits;
+        ASSERT_TRUE(tiff) << label;
         EXPECT_EQ(Field<uint16_t>(tiff.get(), TIFFTAG_BITSPERSAMPLE), c.bits);
         EXPECT_EQ(Field<uint16_t>(tiff.get(), TIFFTAG_SAMPLEFORMAT), c.format);
         EXPECT_EQ(Field<uint16_t>(tiff.get(), TIFFTAG_SAMPLESPERPIXEL),
                   c.samples);
-        EXPECT_EQ(Field<uint32_t>(tiff.get(), TIFFTAG_ROWSPERSTRIP),
-                  static_cast<uint32_t>(stripRows));
-        EXPECT_GT(stripRows, 1);
-        EXPECT_LT(stripRows, height);
-        EXPECT_EQ(ReadAllRows(tiff.get(), c.pixelBytes * width, height), data)
-            << c.bits << " bits, " << c.channels << " channel(s)";
+        EXPECT_EQ(Field<uint32_t>(tiff.get(), TIFFTAG_TILEWIDTH), 512u);
+        EXPECT_EQ(Field<uint32_t>(tiff.get(), TIFFTAG_TILELENGTH), 512u);
+        EXPECT_EQ(Field<uint16_t>(tiff.get(), TIFFTAG_COMPRESSION), c.scheme)
+            << label;
+        // libtiff knows the predictor only of files it decompresses.
+        if (c.scheme != COMPRESSION_NONE) {
+            EXPECT_EQ(Field<uint16_t>(tiff.get(), TIFFTAG_PREDICTOR),
+                      c.predictor)
+                << label;
+        }
+        EXPECT_EQ(rs2test::ReadPixels(tiff.get()), data) << label;
         EXPECT_EQ(TiffVersion(path), 42);
     }
 }
@@ -204,9 +211,10 @@ TEST(GeoTiffWriter, becomes_a_bigtiff_only_beyond_4_gib) {
         bool big;
     };
     // 8 bytes a pixel. A classic TIFF keeps 64 MiB of its 4 GiB for tags:
-    // 16384 x 32255 pixels fit beside them, one more row does not.
+    // 16384 x 31744 pixels (62 rows of 512 x 512 tiles) fit beside them; one
+    // more row takes a 63rd row of tiles, which does not.
     const Case cases[] = {
-        {1000, 1000, false}, {16384, 32255, false}, {16384, 32256, true}};
+        {1000, 1000, false}, {16384, 31744, false}, {16384, 31745, true}};
     rs2test::TempDir folder;
     for (const Case &c : cases) {
         const std::string path = folder.File("big.tif");

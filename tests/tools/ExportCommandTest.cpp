@@ -358,6 +358,7 @@ TEST(ExportCommand, bad_usage_and_failures_leave_no_file_behind) {
         {sgf.Xml() + " " + out + " --window 20 0 10 1", 2,
          "does not lie within the 24 x 16 raster"},
         {sgf.Xml() + " " + out + " --window -1 0 4 4", 2, "does not lie"},
+        {sgf.Xml() + " " + out + " --compress jpeg", 2, "--compress"},
         {sgf.Xml() + " " + Quoted(sgf.out.File("no/folder/out.tif")), 1,
          "cannot write"},
         {sgf.Xml("?c=sigma0") + " " + out, 1, "sigma0"},
@@ -439,14 +440,19 @@ TEST(ExportCommand, gdal_reads_the_bands_and_metadata_an_export_declares) {
         std::string arguments;
         std::string type, units, calibration;
         bool nanIsNoData;
+        std::string compression; // as GDAL names it; empty: none
     };
     const Case cases[] = {
-        {&sgf, "", "Int32", "DN", "None", false},
-        {&sgf, "?c=sigma --denoise --db", "Float32", "dB", "Sigma0", true},
-        {&sgf, "?c=beta --looks 2x2", "Float32", "linear", "Beta0", false},
-        {&sgf, " --looks 2x1", "Float32", "DN^2", "None", false},
-        {&slc, " --channels 2", "CInt16", "DN", "None", false},
-        {&slc, "?c=gamma", "CFloat32", "linear", "Gamma", false},
+        {&sgf, "", "Int32", "DN", "None", false, ""},
+        {&sgf, "?c=sigma --denoise --db --compress deflate", "Float32", "dB",
+         "Sigma0", true, "DEFLATE"},
+        {&sgf, "?c=beta --looks 2x2 --compress zstd", "Float32", "linear",
+         "Beta0", false, "ZSTD"},
+        {&sgf, " --looks 2x1", "Float32", "DN^2", "None", false, ""},
+        {&slc, " --channels 2 --compress lzw", "CInt16", "DN", "None", false,
+         "LZW"},
+        {&slc, "?c=gamma --compress none", "CFloat32", "linear", "Gamma", false,
+         ""},
     };
     for (const Case &c : cases) {
         const Product &p = *c.product;
@@ -460,6 +466,8 @@ TEST(ExportCommand, gdal_reads_the_bands_and_metadata_an_export_declares) {
         const CommandResult info = RunShell("gdalinfo -json " + Quoted(out));
         ASSERT_EQ(info.exitCode, 0) << label << ": " << info.errors;
         const auto json = nlohmann::json::parse(info.output);
+        const auto &structure = json["metadata"]["IMAGE_STRUCTURE"];
+        EXPECT_EQ(structure.value("COMPRESSION", ""), c.compression) << label;
         const auto &items = json["metadata"][""];
         EXPECT_EQ(items.value("UNITS", ""), c.units) << label;
         EXPECT_EQ(items.value("CALIBRATION", ""), c.calibration) << label;
@@ -474,6 +482,7 @@ TEST(ExportCommand, gdal_reads_the_bands_and_metadata_an_export_declares) {
         for (size_t band = 0; band < expected.size(); ++band) {
             const auto &b = json["bands"][band];
             EXPECT_EQ(b.value("type", ""), c.type) << label;
+            EXPECT_EQ(b["block"], nlohmann::json::array({512, 512})) << label;
             EXPECT_EQ(b.value("description", ""), expected[band]) << label;
             EXPECT_EQ(b["metadata"][""].value("POLARIZATION", ""),
                       expected[band])

@@ -20,6 +20,7 @@
 #include <cstddef>
 #include <cstdio>
 #include <cstring>
+#include <map>
 #include <stdexcept>
 
 namespace {
@@ -129,11 +130,11 @@ void ReadBand(const host::Raster &raster, const ExportPlan &plan,
     RequireCompleteReads();
 }
 
-// Band height: whole strips of the file, about kBandBytes.
+// Band height: whole rows of tiles of the file, about kBandBytes.
 int32_t BandRows(const host::GeoTiffWriter &writer, int32_t height) {
-    const auto strip = static_cast<size_t>(writer.RowsPerStrip());
+    const auto tileRow = static_cast<size_t>(writer.RowsPerTileRow());
     const size_t rows = std::max<size_t>(1, kBandBytes / writer.RowBytes());
-    const size_t whole = rows >= strip ? rows - rows % strip : rows;
+    const size_t whole = rows >= tileRow ? rows - rows % tileRow : rows;
     return static_cast<int32_t>(
         std::min<size_t>(whole, static_cast<size_t>(height)));
 }
@@ -168,8 +169,8 @@ void WriteSamples(const host::Raster &raster, const ExportPlan &plan,
     }
 }
 
-// Output rows of a backscatter band: whole strips of the file when the grid
-// rows they take fit kBandBytes, else fewer.
+// Output rows of a backscatter band: whole rows of tiles of the file when the
+// grid rows they take fit kBandBytes, else fewer.
 int32_t BackscatterBandRows(const host::GeoTiffWriter &writer,
                             const ExportPlan &plan) {
     const size_t gridRowBytes = static_cast<size_t>(plan.gridWidth) *
@@ -221,6 +222,16 @@ void WriteBackscatter(const host::Raster &raster, const ExportPlan &plan,
     }
 }
 
+// The --compress values, by the name each compression goes by.
+std::map<std::string, host::GeoTiffCompression> CompressionNames() {
+    std::map<std::string, host::GeoTiffCompression> names;
+    for (const auto compression :
+         {host::GeoTiffCompression::None, host::GeoTiffCompression::Deflate,
+          host::GeoTiffCompression::Zstd, host::GeoTiffCompression::Lzw})
+        names.emplace(host::CompressionName(compression), compression);
+    return names;
+}
+
 void RunExport(ExportOptions options) {
     options.name = NameWithCalibration(options.name, options.calibration);
     // What the target is can be told before the dataset is opened; whether
@@ -236,7 +247,8 @@ void RunExport(ExportOptions options) {
     {
         host::GeoTiffWriter writer(part.Path(), plan.width, plan.height,
                                    static_cast<int32_t>(plan.channels.size()),
-                                   plan.sampleType);
+                                   plan.sampleType,
+                                   CompressionNames().at(options.compression));
         writer.SetGeoreferencing(geo);
         writer.SetDescription(DescribeExport(raster, plan));
         if (plan.backscatter)
@@ -284,6 +296,10 @@ void AddExportCommand(CLI::App &app) {
                       "with --denoise: set negative power to 0");
     command->add_option("--looks", options.looks,
                         "AxR: mean power of blocks of A lines by R columns");
+    command
+        ->add_option("--compress", options.compression,
+                     "none (default), deflate, zstd or lzw")
+        ->check(CLI::IsMember(CompressionNames()));
     command->footer(
         "Samples: complex channels are written as complex float32 when "
         "calibrated, as complex int16 when raw; detected "
@@ -300,6 +316,9 @@ void AddExportCommand(CLI::App &app) {
         "averages power over A lines by R columns (edge blocks over the "
         "samples they hold) and scales the georeferencing to match. The "
         "steps apply in this order: power, noise, looks, dB.\n"
+        "Files are tiled (512 x 512). --compress deflate|zstd|lzw compresses "
+        "them without loss, integers with the horizontal predictor and real "
+        "floats with the floating-point one; none keeps writing fastest.\n"
         "Each band is named by its channel's polarization; the GDAL metadata "
         "tag holds the product id and type, satellite, beam mode, first-line "
         "time, pass direction, calibration and units (DN, DN^2, linear, dB), "

@@ -15,7 +15,8 @@ struct ExportOptions {
     std::vector<int32_t> window;     // x y w h
     std::vector<int32_t> bufferSize; // bw bh
     std::vector<int32_t> channels;
-    std::string looks; // "AxR"
+    std::string looks;                // "AxR"
+    std::string compression = "none"; // a CompressionName
     bool decibels = false;
     bool denoise = false;
     bool clamp = false;
