@@ -27,8 +27,9 @@ struct SampleFormatEntry {
     int32_t channelType;
 };
 
-// The sample formats the reader decodes. A complex-integer sample's
-// BitsPerSample counts both halves. 8-bit signed samples have no host channel
+// The sample formats the reader decodes. A complex sample's BitsPerSample
+// counts both halves, which are presented as two channels (real part, then
+// imaginary part). 8-bit signed samples have no host channel
 // type of their own and are presented as int16 channels.
 constexpr SampleFormatEntry kSampleFormats[] = {
     {SAMPLEFORMAT_UINT, 8, ElementType::UInt8, 1, 1, kChanUInt8},
@@ -40,6 +41,7 @@ constexpr SampleFormatEntry kSampleFormats[] = {
     {SAMPLEFORMAT_IEEEFP, 32, ElementType::Float32, 4, 1, kChanFloat32},
     {SAMPLEFORMAT_COMPLEXINT, 32, ElementType::Int16, 2, 2, kChanInt16},
     {SAMPLEFORMAT_COMPLEXINT, 64, ElementType::Int32, 4, 2, kChanInt32},
+    {SAMPLEFORMAT_COMPLEXIEEEFP, 64, ElementType::Float32, 4, 2, kChanFloat32},
 };
 
 void ReadSampleFormat(const TiffFile &file, TiffLayout &layout) {

@@ -74,6 +74,7 @@ const FormatCase kFormats[] = {
     {"float32", 32, SAMPLEFORMAT_IEEEFP, 1, 4000, 0.25, 500, kChanFloat32, 1},
     {"complex int16", 32, SAMPLEFORMAT_COMPLEXINT, 97, 65536, 1, 32768, kChanInt16, 2},
     {"complex int32", 64, SAMPLEFORMAT_COMPLEXINT, 2654435761u, k2To32, 1, 2147483648.0, kChanInt32, 2},
+    {"complex float32", 64, SAMPLEFORMAT_COMPLEXIEEEFP, 1, 4000, 0.25, 500, kChanFloat32, 2},
 };
 // clang-format on
 const FormatCase &kUInt8 = kFormats[0];
@@ -391,7 +392,7 @@ TEST(GeoTiffImage, refuses_files_it_cannot_decode) {
         {"1-bit samples", 1, SAMPLEFORMAT_UINT, kGrey},
         {"12-bit samples", 12, SAMPLEFORMAT_UINT, kGrey},
         {"64-bit floats", 64, SAMPLEFORMAT_IEEEFP, kGrey},
-        {"complex floats", 64, SAMPLEFORMAT_COMPLEXIEEEFP, kGrey},
+        {"complex doubles", 128, SAMPLEFORMAT_COMPLEXIEEEFP, kGrey},
         {"complex 8-bit integers", 16, SAMPLEFORMAT_COMPLEXINT, kGrey},
         {"subsampled YCbCr", 8, SAMPLEFORMAT_UINT, PHOTOMETRIC_YCBCR},
     };
