@@ -1,8 +1,8 @@
 #include "host/GeoTiffWriter.hpp"
 #include "host/Raster.hpp"
 #include "tests/support/TempDir.hpp"
-#include "tests/support/TiffContents.hpp"
 #include "tests/support/TiffInspection.hpp"
+#include "tests/support/TiffPixels.hpp"
 
 #include <geotiffio.h>
 #include <geovalues.h>

@@ -31,10 +31,6 @@ struct TiffContents {
     }
 };
 
-/// The pixels of the current image, row after row, whether it is tiled or
-/// stripped; empty when they cannot be read.
-std::vector<unsigned char> ReadPixels(TIFF *tiff);
-
 /// The file's pixels, matrix, tie points and main GeoKeys; empty contents
 /// when it cannot be read.
 TiffContents ReadTiff(const std::string &path);
