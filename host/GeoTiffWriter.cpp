@@ -193,10 +193,11 @@ struct GeoTiffWriter::State {
     size_t rowBytes = 0;
     size_t pixelBytes = 0;
     bool bigTiff = false;
-    int32_t nextRow = 0;      // first row of the tile row being assembled
-    int32_t bufferedRows = 0; // rows of that tile row held in tileRow
-    std::vector<unsigned char> tileRow;
-    std::vector<unsigned char> tile; // one tile, as libtiff encodes it
+    int32_t nextRow = 0;      // first row of the row of tiles being assembled
+    int32_t bufferedRows = 0; // rows of it held in tiles
+    // The row of tiles being assembled, tile after tile, each as libtiff
+    // encodes it.
+    std::vector<unsigned char> tiles;
     bool georeferenced = false;
     bool described = false;
     bool failed = false;
@@ -237,41 +238,47 @@ struct GeoTiffWriter::State {
         return std::min(kTileSize, height - firstRow);
     }
 
-    // Cuts the rows of one row of tiles (TileRowRows(firstRow) rows of
-    // data) into its tiles and writes them. Tiles beyond the right or bottom
-    // edge are filled with zeros.
-    void WriteTileRow(int32_t firstRow, const unsigned char *data) {
-        const size_t tileRowBytes = pixelBytes * kTileSize;
-        if (tile.empty())
-            tile.resize(tileRowBytes * kTileSize);
+    size_t TileRowBytes() const { return pixelBytes * kTileSize; }
+    size_t TileBytes() const { return TileRowBytes() * kTileSize; }
+
+    // Copies count rows into the tiles of the row of tiles being assembled,
+    // where they go on from row bufferedRows. What lies beyond the right edge
+    // of the image stays zero.
+    void Buffer(const unsigned char *rows, int32_t count) {
+        const size_t tileRowBytes = TileRowBytes();
+        const size_t across = (rowBytes + tileRowBytes - 1) / tileRowBytes;
+        if (tiles.empty())
+            tiles.resize(across * TileBytes());
+        for (int32_t i = 0; i < count; ++i) {
+            const unsigned char *row = rows + rowBytes * static_cast<size_t>(i);
+            unsigned char *target =
+                tiles.data() +
+                tileRowBytes * static_cast<size_t>(bufferedRows + i);
+            for (size_t t = 0; t < across; ++t)
+                std::memcpy(
+                    target + TileBytes() * t, row + tileRowBytes * t,
+                    std::min(tileRowBytes, rowBytes - tileRowBytes * t));
+        }
+        bufferedRows += count;
+    }
+
+    // Writes the assembled row of tiles, which starts at image row firstRow.
+    // The rows of the bottom tiles below the image become zero.
+    void WriteTiles(int32_t firstRow) {
         const int32_t rows = TileRowRows(firstRow);
-        for (int32_t x = 0; x < width; x += kTileSize) {
-            const size_t bytes =
-                pixelBytes *
-                static_cast<size_t>(std::min(kTileSize, width - x));
-            if (bytes < tileRowBytes || rows < kTileSize)
-                std::fill(tile.begin(), tile.end(), 0);
-            for (int32_t row = 0; row < rows; ++row)
-                std::memcpy(tile.data() + tileRowBytes * row,
-                            data + rowBytes * row + pixelBytes * x, bytes);
+        const size_t count = tiles.size() / TileBytes();
+        for (size_t t = 0; t < count; ++t) {
+            unsigned char *tile = tiles.data() + TileBytes() * t;
+            std::fill(tile + TileRowBytes() * static_cast<size_t>(rows),
+                      tile + TileBytes(), 0);
             const uint32_t index =
-                TIFFComputeTile(tiff, static_cast<uint32_t>(x),
+                TIFFComputeTile(tiff, static_cast<uint32_t>(t * kTileSize),
                                 static_cast<uint32_t>(firstRow), 0, 0);
-            if (TIFFWriteEncodedTile(tiff, index, tile.data(),
-                                     static_cast<tmsize_t>(tile.size())) < 0)
+            if (TIFFWriteEncodedTile(tiff, index, tile,
+                                     static_cast<tmsize_t>(TileBytes())) < 0)
                 Fail("cannot write rows " + std::to_string(firstRow) + " to " +
                      std::to_string(firstRow + rows - 1));
         }
-    }
-
-    // Appends count rows to the row of tiles being assembled.
-    void Buffer(const unsigned char *rows, int32_t count) {
-        if (tileRow.empty())
-            tileRow.resize(rowBytes * static_cast<size_t>(kTileSize));
-        std::memcpy(tileRow.data() +
-                        rowBytes * static_cast<size_t>(bufferedRows),
-                    rows, rowBytes * static_cast<size_t>(count));
-        bufferedRows += count;
     }
 
     void SetLayout(int32_t channels, SampleType type,
@@ -534,17 +541,12 @@ void GeoTiffWriter::WriteRows(int32_t firstRow, int32_t rowCount,
     while (remaining > 0) {
         const int32_t tileRowRows = s.TileRowRows(s.nextRow);
         const int32_t take = std::min(remaining, tileRowRows - s.bufferedRows);
-        if (take == tileRowRows) {
-            s.WriteTileRow(s.nextRow, rows);
-        } else {
-            s.Buffer(rows, take);
-            if (s.bufferedRows == tileRowRows) {
-                s.WriteTileRow(s.nextRow, s.tileRow.data());
-                s.bufferedRows = 0;
-            }
-        }
-        if (s.bufferedRows == 0)
+        s.Buffer(rows, take);
+        if (s.bufferedRows == tileRowRows) {
+            s.WriteTiles(s.nextRow);
+            s.bufferedRows = 0;
             s.nextRow += tileRowRows;
+        }
         rows += s.rowBytes * static_cast<size_t>(take);
         remaining -= take;
     }

@@ -109,8 +109,8 @@ class VXB_API GeoTiffWriter {
 
     /// Bytes of one row of pixels, as WriteRows expects them.
     size_t RowBytes() const;
-    /// Rows of a row of tiles; bands of a multiple of it are cut into tiles
-    /// without being buffered first.
+    /// Rows of a row of tiles: the writer holds them, cut into tiles, until
+    /// the last of them comes, then writes the tiles.
     int32_t RowsPerTileRow() const;
     /// True when the file is a BigTIFF.
     bool IsBigTiff() const;
