@@ -335,6 +335,7 @@ void AddExportCommand(CLI::App &app) {
         "Examples:\n"
         "  rs2 export 'dir/product.xml?c=sigma' sigma0.tif\n"
         "  rs2 export dir sigma0_db.tif --calibration sigma --denoise --db\n"
-        "  rs2 export dir looked.tif --calibration gamma --looks 4x2 --db");
+        "  rs2 export dir looked.tif --calibration gamma --looks 4x2 --db\n"
+        "  rs2 export dir slc.tif --compress zstd");
     command->callback([] { RunExport(options); });
 }
