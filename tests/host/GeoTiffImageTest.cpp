@@ -110,20 +110,20 @@ const LayoutCase kLayouts[] = {
 };
 // clang-format on
 
-TiffShape SpecFor(const FormatCase &format, const LayoutCase &layout) {
-    TiffShape spec;
-    spec.width = kWidth;
-    spec.height = kHeight;
-    spec.samplesPerPixel = 2;
-    spec.bitsPerSample = format.bitsPerSample;
-    spec.sampleFormat = format.sampleFormat;
-    spec.planarConfig = layout.planarConfig;
-    spec.compression = layout.compression;
-    spec.predictor = layout.predictor;
-    spec.rowsPerStrip = layout.rowsPerStrip;
-    spec.tileSize = layout.tileSize;
-    spec.bigEndian = layout.bigEndian;
-    return spec;
+TiffShape ShapeFor(const FormatCase &format, const LayoutCase &layout) {
+    TiffShape shape;
+    shape.width = kWidth;
+    shape.height = kHeight;
+    shape.samplesPerPixel = 2;
+    shape.bitsPerSample = format.bitsPerSample;
+    shape.sampleFormat = format.sampleFormat;
+    shape.planarConfig = layout.planarConfig;
+    shape.compression = layout.compression;
+    shape.predictor = layout.predictor;
+    shape.rowsPerStrip = layout.rowsPerStrip;
+    shape.tileSize = layout.tileSize;
+    shape.bigEndian = layout.bigEndian;
+    return shape;
 }
 
 float ExpectedReal(double value) { return static_cast<float>(value); }
@@ -170,7 +170,7 @@ TEST(GeoTiffImage, windows_match_the_written_samples_in_every_layout) {
         for (const LayoutCase &layout : kLayouts) {
             SCOPED_TRACE(std::string(format.name) + ", " + layout.name);
             const std::string path = dir.File("image.tif");
-            rs2test::WriteTiff(path, SpecFor(format, layout), format.Values());
+            rs2test::WriteTiff(path, ShapeFor(format, layout), format.Values());
             std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
             const int32_t last = 2 * format.channelsPerSample;
             ASSERT_EQ(image->ChannelCount(), last);
@@ -206,7 +206,8 @@ TEST(GeoTiffImage, sample_layout_is_told_as_the_file_declares_it) {
     const std::string path = dir.File("image.tif");
     for (const FormatCase &format : kFormats) {
         SCOPED_TRACE(format.name);
-        rs2test::WriteTiff(path, SpecFor(format, kLayouts[0]), format.Values());
+        rs2test::WriteTiff(path, ShapeFor(format, kLayouts[0]),
+                           format.Values());
         FILE *fp = VXBOpen(path.c_str(), "r");
         ASSERT_NE(fp, nullptr);
         int32_t sampleFormat = 0, bits = 0, samples = 0;
@@ -291,7 +292,7 @@ TEST(GeoTiffImage, decodes_only_the_blocks_a_window_needs) {
                                    PREDICTOR_NONE, c.rowsPerStrip, c.tileSize,
                                    false};
         const std::string path = dir.File("corrupt.tif");
-        rs2test::WriteTiff(path, SpecFor(kUInt16, layout), kUInt16.Values());
+        rs2test::WriteTiff(path, ShapeFor(kUInt16, layout), kUInt16.Values());
         Corrupt(path, c.corrupted);
         std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
         ExpectWindow(*image, kUInt16.Values(), ExpectedReal, c.avoiding,
@@ -303,7 +304,7 @@ TEST(GeoTiffImage, decodes_only_the_blocks_a_window_needs) {
 TEST(GeoTiffImage, refuses_bad_requests_without_writing) {
     TempDir dir;
     const std::string path = dir.File("image.tif");
-    rs2test::WriteTiff(path, SpecFor(kUInt16, kLayouts[0]), kUInt16.Values());
+    rs2test::WriteTiff(path, ShapeFor(kUInt16, kLayouts[0]), kUInt16.Values());
     std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
     const int32_t big = std::numeric_limits<int32_t>::max();
     struct Case {
@@ -345,7 +346,7 @@ TEST(GeoTiffImage, refuses_bad_requests_without_writing) {
 TEST(GeoTiffImage, window_outside_is_refused_before_anything_is_allocated) {
     TempDir dir;
     const std::string path = dir.File("image.tif");
-    rs2test::WriteTiff(path, SpecFor(kUInt16, kLayouts[0]), kUInt16.Values());
+    rs2test::WriteTiff(path, ShapeFor(kUInt16, kLayouts[0]), kUInt16.Values());
     FILE *fp = VXBOpen(path.c_str(), "r");
     ASSERT_NE(fp, nullptr);
     const int32_t big = std::numeric_limits<int32_t>::max();
@@ -399,16 +400,16 @@ TEST(GeoTiffImage, refuses_files_it_cannot_decode) {
     TempDir dir;
     for (const Case &c : cases) {
         SCOPED_TRACE(c.what);
-        TiffShape spec;
-        spec.width = 16;
-        spec.height = 16;
-        spec.bitsPerSample = c.bitsPerSample;
-        spec.sampleFormat = c.sampleFormat;
-        spec.photometric = c.photometric;
-        spec.samplesPerPixel = c.photometric == PHOTOMETRIC_YCBCR ? 3 : 1;
-        spec.rowsPerStrip = 16;
+        TiffShape shape;
+        shape.width = 16;
+        shape.height = 16;
+        shape.bitsPerSample = c.bitsPerSample;
+        shape.sampleFormat = c.sampleFormat;
+        shape.photometric = c.photometric;
+        shape.samplesPerPixel = c.photometric == PHOTOMETRIC_YCBCR ? 3 : 1;
+        shape.rowsPerStrip = 16;
         const std::string path = dir.File("unsupported.tif");
-        rs2test::WriteTiff(path, spec, kUInt8.Values());
+        rs2test::WriteTiff(path, shape, kUInt8.Values());
         EXPECT_TRUE(host::HasTiffSignature(path));
         ExpectErrorNaming(path, [&] { GeoTiffImage::Open(path); });
     }
@@ -425,7 +426,7 @@ TEST(GeoTiffImage, refuses_files_it_cannot_decode) {
 TEST(GeoTiffImage, truncated_file_fails_to_open_or_to_read) {
     TempDir dir;
     const std::string path = dir.File("cut.tif");
-    rs2test::WriteTiff(path, SpecFor(kFormats[3], kLayouts[5]),
+    rs2test::WriteTiff(path, ShapeFor(kFormats[3], kLayouts[5]),
                        kFormats[3].Values());
     // The second half, with the directory libtiff writes last, is gone.
     std::filesystem::resize_file(path, std::filesystem::file_size(path) / 2);
@@ -445,11 +446,11 @@ TEST(GeoTiffImage, truncated_file_fails_to_open_or_to_read) {
 TEST(GeoTiffImage, file_truncated_while_open_gives_a_read_error) {
     TempDir dir;
     const std::string path = dir.File("shrinking.tif");
-    TiffShape spec;
-    spec.width = 1024;
-    spec.height = 1024;
-    spec.tileSize = 512;
-    rs2test::WriteTiff(path, spec, kUInt16.Values());
+    TiffShape shape;
+    shape.width = 1024;
+    shape.height = 1024;
+    shape.tileSize = 512;
+    rs2test::WriteTiff(path, shape, kUInt16.Values());
     const host::TiffFile file(path);
     std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
     std::filesystem::resize_file(path, std::filesystem::file_size(path) / 4);
@@ -470,15 +471,15 @@ std::string LittleEndian32(uint64_t value) {
 TEST(GeoTiffImage, missing_uncompressed_strip_is_refused_before_writing) {
     TempDir dir;
     const std::string path = dir.File("short.tif");
-    TiffShape spec;
-    spec.width = 10;
-    spec.height = 8;
-    spec.bitsPerSample = 8;
-    spec.rowsPerStrip = 4;
+    TiffShape shape;
+    shape.width = 10;
+    shape.height = 8;
+    shape.bitsPerSample = 8;
+    shape.rowsPerStrip = 4;
     const rs2test::ElementValue value = [](uint32_t x, uint32_t y, uint32_t) {
         return double(y * 10 + x);
     };
-    rs2test::WriteTiff(path, spec, value);
+    rs2test::WriteTiff(path, shape, value);
     // Point the second strip at the end of the file: its data is missing.
     const auto strips = rs2test::StoredBlocks(path);
     ASSERT_EQ(strips.size(), 2u);
@@ -612,7 +613,7 @@ TEST(GeoTiffImage, blocks_sharing_one_stream_are_decoded_once) {
         SCOPED_TRACE(tileSize != 0 ? "tiles" : "strips");
         const LayoutCase layout = {"shared", kContig,  kDeflate, PREDICTOR_NONE,
                                    4,        tileSize, false};
-        TiffShape shape = SpecFor(kUInt16, layout);
+        TiffShape shape = ShapeFor(kUInt16, layout);
         shape.width = 64;
         shape.height = 32;
         const std::string path = dir.File("shared.tif");
@@ -691,13 +692,13 @@ TEST(GeoTiffImage, georeferencing_gives_the_system_transform_and_tie_points) {
     TempDir dir;
     for (const Case &c : cases) {
         SCOPED_TRACE(c.what);
-        TiffShape spec = SpecFor(kUInt8, kLayouts[0]);
-        spec.geoKeys = c.keys;
-        spec.pixelScale = c.pixelScale;
-        spec.tiePoints = c.tiePoints;
-        spec.transformMatrix = c.matrix;
+        TiffShape shape = ShapeFor(kUInt8, kLayouts[0]);
+        shape.geoKeys = c.keys;
+        shape.pixelScale = c.pixelScale;
+        shape.tiePoints = c.tiePoints;
+        shape.transformMatrix = c.matrix;
         const std::string path = dir.File("geo.tif");
-        rs2test::WriteTiff(path, spec, kUInt8.Values());
+        rs2test::WriteTiff(path, shape, kUInt8.Values());
         std::unique_ptr<GeoTiffImage> image = GeoTiffImage::Open(path);
         const ProjInfo_t projection = image->Projection();
         EXPECT_STREQ(projection.geosys, c.geosys);
@@ -736,10 +737,10 @@ std::vector<double> RpcValues() {
 
 std::unique_ptr<GeoTiffImage> OpenWithRpc(const TempDir &dir,
                                           const std::vector<double> &values) {
-    TiffShape spec = SpecFor(kUInt16, kLayouts[0]);
-    spec.rpcCoefficients = values;
+    TiffShape shape = ShapeFor(kUInt16, kLayouts[0]);
+    shape.rpcCoefficients = values;
     const std::string path = dir.File("rpc.tif");
-    rs2test::WriteTiff(path, spec, kUInt16.Values());
+    rs2test::WriteTiff(path, shape, kUInt16.Values());
     return GeoTiffImage::Open(path);
 }
 

@@ -46,13 +46,13 @@ RecordKeeper Decode(const std::vector<unsigned char> &block) {
 }
 
 // Replaces the product's first image with a 16-bit GeoTIFF of the same
-// size carrying the georeferencing of spec.
+// size carrying the georeferencing of shape.
 void ReplaceImage(const rs2gen::GeneratedProduct &product,
                   const rs2gen::ProductOptions &options,
-                  rs2test::TiffShape spec) {
-    spec.width = static_cast<uint32_t>(options.width);
-    spec.height = static_cast<uint32_t>(options.height);
-    rs2test::WriteTiff(product.imageFiles[0], spec,
+                  rs2test::TiffShape shape) {
+    shape.width = static_cast<uint32_t>(options.width);
+    shape.height = static_cast<uint32_t>(options.height);
+    rs2test::WriteTiff(product.imageFiles[0], shape,
                        [](uint32_t x, uint32_t y, uint32_t) {
                            return static_cast<double>(x + y);
                        });
@@ -60,19 +60,19 @@ void ReplaceImage(const rs2gen::GeneratedProduct &product,
 
 // North-up in UTM zone 10 north (EPSG 32610), 10 m pixels.
 rs2test::TiffShape UtmImage() {
-    rs2test::TiffShape spec;
-    spec.geoKeys = {1024, 1, 1025, 1, 3072, 32610};
-    spec.pixelScale = {10.0, 10.0, 0.0};
-    spec.tiePoints = {0.0, 0.0, 0.0, 480000.0, 5450000.0, 0.0};
-    return spec;
+    rs2test::TiffShape shape;
+    shape.geoKeys = {1024, 1, 1025, 1, 3072, 32610};
+    shape.pixelScale = {10.0, 10.0, 0.0};
+    shape.tiePoints = {0.0, 0.0, 0.0, 480000.0, 5450000.0, 0.0};
+    return shape;
 }
 
 // No georeferencing, but an RPC model of its own (every value non-zero).
 rs2test::TiffShape ImageWithRpc() {
-    rs2test::TiffShape spec;
+    rs2test::TiffShape shape;
     for (int i = 0; i < 92; ++i)
-        spec.rpcCoefficients.push_back(i + 1.5);
-    return spec;
+        shape.rpcCoefficients.push_back(i + 1.5);
+    return shape;
 }
 
 ProjInfo_t ProjectionOf(const std::string &path) {

@@ -66,38 +66,38 @@ std::vector<uint16_t> KeyDirectory(const std::vector<uint16_t> &pairs) {
     return directory;
 }
 
-void SetLayoutFields(TIFF *tif, const TiffShape &spec) {
+void SetLayoutFields(TIFF *tif, const TiffShape &shape) {
     // BitsPerSample before SampleFormat: libtiff picks the byte swapping of
     // complex samples from both, in that order.
-    TIFFSetField(tif, TIFFTAG_IMAGEWIDTH, spec.width);
-    TIFFSetField(tif, TIFFTAG_IMAGELENGTH, spec.height);
-    TIFFSetField(tif, TIFFTAG_SAMPLESPERPIXEL, spec.samplesPerPixel);
-    TIFFSetField(tif, TIFFTAG_BITSPERSAMPLE, spec.bitsPerSample);
-    TIFFSetField(tif, TIFFTAG_SAMPLEFORMAT, spec.sampleFormat);
-    TIFFSetField(tif, TIFFTAG_PLANARCONFIG, spec.planarConfig);
-    TIFFSetField(tif, TIFFTAG_PHOTOMETRIC, spec.photometric);
-    if (spec.photometric == PHOTOMETRIC_YCBCR)
+    TIFFSetField(tif, TIFFTAG_IMAGEWIDTH, shape.width);
+    TIFFSetField(tif, TIFFTAG_IMAGELENGTH, shape.height);
+    TIFFSetField(tif, TIFFTAG_SAMPLESPERPIXEL, shape.samplesPerPixel);
+    TIFFSetField(tif, TIFFTAG_BITSPERSAMPLE, shape.bitsPerSample);
+    TIFFSetField(tif, TIFFTAG_SAMPLEFORMAT, shape.sampleFormat);
+    TIFFSetField(tif, TIFFTAG_PLANARCONFIG, shape.planarConfig);
+    TIFFSetField(tif, TIFFTAG_PHOTOMETRIC, shape.photometric);
+    if (shape.photometric == PHOTOMETRIC_YCBCR)
         TIFFSetField(tif, TIFFTAG_YCBCRSUBSAMPLING, 2, 2);
-    if (TIFFSetField(tif, TIFFTAG_COMPRESSION, spec.compression) != 1)
+    if (TIFFSetField(tif, TIFFTAG_COMPRESSION, shape.compression) != 1)
         throw std::runtime_error("compression not available");
-    if (spec.predictor != PREDICTOR_NONE)
-        TIFFSetField(tif, TIFFTAG_PREDICTOR, spec.predictor);
-    if (spec.tileSize > 0) {
-        TIFFSetField(tif, TIFFTAG_TILEWIDTH, spec.tileSize);
-        TIFFSetField(tif, TIFFTAG_TILELENGTH, spec.tileSize);
+    if (shape.predictor != PREDICTOR_NONE)
+        TIFFSetField(tif, TIFFTAG_PREDICTOR, shape.predictor);
+    if (shape.tileSize > 0) {
+        TIFFSetField(tif, TIFFTAG_TILEWIDTH, shape.tileSize);
+        TIFFSetField(tif, TIFFTAG_TILELENGTH, shape.tileSize);
     } else {
-        TIFFSetField(tif, TIFFTAG_ROWSPERSTRIP, spec.rowsPerStrip);
+        TIFFSetField(tif, TIFFTAG_ROWSPERSTRIP, shape.rowsPerStrip);
     }
 }
 
-void SetGeoFields(TIFF *tif, const TiffShape &spec) {
+void SetGeoFields(TIFF *tif, const TiffShape &shape) {
     DefineGeoTags(tif);
-    SetArrayField(tif, kGeoPixelScaleTag, spec.pixelScale);
-    SetArrayField(tif, kGeoTiePointsTag, spec.tiePoints);
-    SetArrayField(tif, kGeoTransformMatrixTag, spec.transformMatrix);
-    if (!spec.geoKeys.empty())
-        SetArrayField(tif, kGeoKeyDirectoryTag, KeyDirectory(spec.geoKeys));
-    SetArrayField(tif, kRpcCoefficientTag, spec.rpcCoefficients);
+    SetArrayField(tif, kGeoPixelScaleTag, shape.pixelScale);
+    SetArrayField(tif, kGeoTiePointsTag, shape.tiePoints);
+    SetArrayField(tif, kGeoTransformMatrixTag, shape.transformMatrix);
+    if (!shape.geoKeys.empty())
+        SetArrayField(tif, kGeoKeyDirectoryTag, KeyDirectory(shape.geoKeys));
+    SetArrayField(tif, kRpcCoefficientTag, shape.rpcCoefficients);
 }
 
 template <typename T> void Store(unsigned char *at, double value) {
@@ -139,18 +139,18 @@ struct BlockPlace {
 
 class BlockFiller {
   public:
-    explicit BlockFiller(const TiffShape &specIn) : spec(specIn) {
-        const bool complex = spec.sampleFormat == SAMPLEFORMAT_COMPLEXINT ||
-                             spec.sampleFormat == SAMPLEFORMAT_COMPLEXIEEEFP;
+    explicit BlockFiller(const TiffShape &specIn) : shape(specIn) {
+        const bool complex = shape.sampleFormat == SAMPLEFORMAT_COMPLEXINT ||
+                             shape.sampleFormat == SAMPLEFORMAT_COMPLEXIEEEFP;
         elementsPerSample = complex ? 2 : 1;
-        const uint16_t elementBits = spec.bitsPerSample / elementsPerSample;
-        store = spec.photometric == PHOTOMETRIC_YCBCR
+        const uint16_t elementBits = shape.bitsPerSample / elementsPerSample;
+        store = shape.photometric == PHOTOMETRIC_YCBCR
                     ? nullptr
-                    : ElementStorer(spec.sampleFormat, elementBits);
+                    : ElementStorer(shape.sampleFormat, elementBits);
         elementBytes = elementBits / 8;
-        separate = spec.planarConfig == PLANARCONFIG_SEPARATE;
+        separate = shape.planarConfig == PLANARCONFIG_SEPARATE;
         pixelElements = separate ? elementsPerSample
-                                 : spec.samplesPerPixel * elementsPerSample;
+                                 : shape.samplesPerPixel * elementsPerSample;
     }
 
     std::vector<unsigned char> Fill(const BlockPlace &place, size_t size,
@@ -166,7 +166,7 @@ class BlockFiller {
         for (uint32_t y = place.y0; y < place.y0 + place.lines; ++y)
             for (uint32_t x = place.x0; x < place.x0 + place.width; ++x)
                 for (uint32_t e = 0; e < pixelElements; ++e) {
-                    const bool inside = x < spec.width && y < spec.height;
+                    const bool inside = x < shape.width && y < shape.height;
                     store(at, inside ? value(x, y, firstElement + e) : 0.0);
                     at += elementBytes;
                 }
@@ -174,7 +174,7 @@ class BlockFiller {
     }
 
   private:
-    const TiffShape &spec;
+    const TiffShape &shape;
     uint32_t elementsPerSample = 1;
     Storer store = nullptr;
     uint32_t elementBytes = 0;
@@ -185,22 +185,23 @@ class BlockFiller {
 // Writes every strip or tile in libtiff's numbering: plane by plane, row
 // by row. A strip is a block as wide as the image; tiles are whole at the
 // image edges, while the last strip holds only the lines left.
-void WriteBlocks(TIFF *tif, const TiffShape &spec, const ElementValue &value) {
-    const BlockFiller filler(spec);
-    const bool tiled = spec.tileSize > 0;
-    const uint32_t blockWidth = tiled ? spec.tileSize : spec.width;
-    const uint32_t blockLines = tiled ? spec.tileSize : spec.rowsPerStrip;
+void WriteBlocks(TIFF *tif, const TiffShape &shape, const ElementValue &value) {
+    const BlockFiller filler(shape);
+    const bool tiled = shape.tileSize > 0;
+    const uint32_t blockWidth = tiled ? shape.tileSize : shape.width;
+    const uint32_t blockLines = tiled ? shape.tileSize : shape.rowsPerStrip;
     const uint32_t planes =
-        spec.planarConfig == PLANARCONFIG_SEPARATE ? spec.samplesPerPixel : 1;
-    const uint32_t across = (spec.width + blockWidth - 1) / blockWidth;
-    const uint32_t down = (spec.height + blockLines - 1) / blockLines;
+        shape.planarConfig == PLANARCONFIG_SEPARATE ? shape.samplesPerPixel : 1;
+    const uint32_t across = (shape.width + blockWidth - 1) / blockWidth;
+    const uint32_t down = (shape.height + blockLines - 1) / blockLines;
     uint32_t index = 0;
     for (uint32_t plane = 0; plane < planes; ++plane)
         for (uint32_t row = 0; row < down; ++row)
             for (uint32_t column = 0; column < across; ++column, ++index) {
                 const uint32_t y0 = row * blockLines;
                 const uint32_t lines =
-                    tiled ? blockLines : std::min(blockLines, spec.height - y0);
+                    tiled ? blockLines
+                          : std::min(blockLines, shape.height - y0);
                 const auto size = static_cast<tmsize_t>(
                     tiled ? TIFFTileSize(tif) : TIFFVStripSize(tif, lines));
                 std::vector<unsigned char> bytes = filler.Fill(
@@ -217,14 +218,14 @@ void WriteBlocks(TIFF *tif, const TiffShape &spec, const ElementValue &value) {
 
 } // namespace
 
-void WriteTiff(const std::string &path, const TiffShape &spec,
+void WriteTiff(const std::string &path, const TiffShape &shape,
                const ElementValue &value) {
-    TiffOwner tif(TIFFOpen(path.c_str(), spec.bigEndian ? "wb" : "wl"));
+    TiffOwner tif(TIFFOpen(path.c_str(), shape.bigEndian ? "wb" : "wl"));
     if (!tif)
         throw std::runtime_error("cannot create " + path);
-    SetLayoutFields(tif.get(), spec);
-    SetGeoFields(tif.get(), spec);
-    WriteBlocks(tif.get(), spec, value);
+    SetLayoutFields(tif.get(), shape);
+    SetGeoFields(tif.get(), shape);
+    WriteBlocks(tif.get(), shape, value);
 }
 
 std::vector<std::pair<uint64_t, uint64_t>>

@@ -38,11 +38,11 @@ struct TiffShape {
 using ElementValue =
     std::function<double(uint32_t x, uint32_t y, uint32_t element)>;
 
-/// Writes spec to path with libtiff; throws std::runtime_error when libtiff
+/// Writes shape to path with libtiff; throws std::runtime_error when libtiff
 /// refuses. Layouts whose elements are not whole bytes, or whose blocks
 /// libtiff sizes differently (subsampled YCbCr), are written as zeros:
 /// tests only use such files to see them refused.
-void WriteTiff(const std::string &path, const TiffShape &spec,
+void WriteTiff(const std::string &path, const TiffShape &shape,
                const ElementValue &value);
 
 /// The (offset, byte count) of every strip or tile of the file at path, in

@@ -231,13 +231,13 @@ TEST(QuicklookCommand, stretches_the_power_in_decibels_between_percentiles) {
 TEST(QuicklookCommand, shows_a_constant_image_mid_grey_and_no_data_black) {
     const rs2test::TempDir folder;
     const std::string tiff = folder.File("power.tif");
-    rs2test::TiffShape spec;
-    spec.width = 8;
-    spec.height = 4;
-    spec.bitsPerSample = 32;
-    spec.sampleFormat = SAMPLEFORMAT_IEEEFP; // float: power as it is
+    rs2test::TiffShape shape;
+    shape.width = 8;
+    shape.height = 4;
+    shape.bitsPerSample = 32;
+    shape.sampleFormat = SAMPLEFORMAT_IEEEFP; // float: power as it is
     // Power 2.0 everywhere but column 0: zero, and negative on row 1.
-    rs2test::WriteTiff(tiff, spec, [](uint32_t x, uint32_t y, uint32_t) {
+    rs2test::WriteTiff(tiff, shape, [](uint32_t x, uint32_t y, uint32_t) {
         return x > 0 ? 2.0 : y == 1 ? -1.0 : 0.0;
     });
     const std::string png = folder.File("q.png");
